@@ -1,0 +1,44 @@
+// Small helpers shared by the tests: temporary directories, files, running programs.
+#ifndef VORN_TESTS_SUPPORT_TEST_UTIL_H
+#define VORN_TESTS_SUPPORT_TEST_UTIL_H
+
+#include <string>
+#include <vector>
+
+namespace vorntest {
+
+// A fresh directory under $TMPDIR (or /tmp), removed with its content by the destructor.
+class TempDir {
+ public:
+  TempDir();
+  ~TempDir();
+  TempDir(const TempDir&) = delete;
+  TempDir& operator=(const TempDir&) = delete;
+  const std::string& path() const { return path_; }
+  std::string operator/(const std::string& name) const { return path_ + "/" + name; }
+
+ private:
+  std::string path_;
+};
+
+std::string ReadFile(const std::string& path);           // "" when unreadable
+bool WriteFile(const std::string& path, const std::string& content, int mode = 0644);
+bool Exists(const std::string& path);
+int FileMode(const std::string& path);                   // st_mode & 07777, -1 when missing
+
+struct RunResult {
+  int status = -1;     // exit status, or 128+signal, or -1 when it could not run
+  std::string out;     // stdout
+  std::string err;     // stderr
+};
+// Runs argv[0] with argv (no shell), optionally feeding stdin; waits at most timeoutSec.
+RunResult Run(const std::vector<std::string>& argv, const std::string& input = "",
+              int timeoutSec = 60);
+
+std::string SourceDir();  // $VORN_SOURCE_DIR (the project's source tree)
+std::string BinaryDir();  // $VORN_BINARY_DIR (the build tree)
+bool InSandbox();         // $VORN_SANDBOX is set: private namespaces, root
+
+}  // namespace vorntest
+
+#endif
