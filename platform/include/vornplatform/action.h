@@ -9,12 +9,16 @@
 #define VORN_PLATFORM_ACTION_DIR "/usr/vorn/libexec/platform"
 
 namespace vornplatform {
-// The action's exit status (0 for a missing action), -1 when it could not run. When out is not
-// NULL it receives the action's stdout (empty for a missing action).
+// Runs VORN_PLATFORM_ACTION_DIR/<name> with args as argv[1..] (argv[0] is its path), stdin from
+// /dev/null, and waits. The action's exit status (0 for a missing action), -1 when it could not
+// run, a signal ended it, or name is not a plain file name (error register set). When out is not
+// NULL it receives the action's stdout (empty for a missing action); otherwise stdout is ours.
 int RunAction(const char* name, const std::vector<std::string>& args, std::string* out = nullptr);
 }  // namespace vornplatform
 
-int VORNFwRuleHup();    // 0 success, negative failure (error register set)
-int VORNFwTcRuleHup();  // 0 success, negative failure
+// The actions "VORNFwRuleHup" and "VORNFwTcRuleHup". 0 success (a missing action included),
+// -1 on failure, a non-zero exit status included (error register set).
+int VORNFwRuleHup();
+int VORNFwTcRuleHup();
 
 #endif

@@ -16,7 +16,9 @@ enum VLIBC_ERR_CODE {
   VLIBC_ERR_BAD_PARAMETER = 0x0D00,
 };
 
-// Records code, file and line (the file as a path below src/ where there is one) for this thread.
+// Records code, file and line (the file as a path below src/ where there is one) for this thread,
+// with the current errno; errno itself is left as it was. A later success does not clear the
+// register: read it right after the failing call.
 void VLIBCErrSetEx(int code, const char* file, int line);
 int VLIBCErrGet();             // the code of the last failure of this thread, 0 when none
 const char* VLIBCErrGetFile(); // the file of the last failure, "" when none (never NULL)

@@ -7,7 +7,8 @@
 char* VLIBCStrTrimSpace(char* text);
 
 // Splits text with strsep() at any of the separator characters and pushes every piece (empty
-// pieces included, untrimmed) onto *list after cleaning it. The number of pieces, -1 on failure.
+// pieces included, untrimmed) onto *list after cleaning it (allocated when *list is NULL).
+// The number of pieces, -1 on failure.
 int VLIBCStrSep(const char* text, const char* separators, PVLIBSZLIST* list);
 
 // 1 when text is valid UTF-8 (a leading BOM is allowed), else 0.

@@ -17,11 +17,12 @@ typedef struct _VLIBSZHASH {
 
 PVLIBSZHASH VLIBCSzHashAlloc(int capacity);               // NULL on no memory
 void VLIBCSzHashFree(PVLIBSZHASH hash);                   // NULL is fine
-int VLIBCSzHashSetValue(PVLIBSZHASH hash, const char* key, const char* value); // 0, -1 refused
+// 0; -1 refused (NULL hash, NULL or empty key, no memory). A NULL value is stored as "".
+int VLIBCSzHashSetValue(PVLIBSZHASH hash, const char* key, const char* value);
 const char* VLIBCSzHashGetValue(PVLIBSZHASH hash, const char* key);          // NULL absent
 int VLIBCSzHashRemoveKey(PVLIBSZHASH hash, const char* key); // 0 removed or absent, -1 bad param
 int VLIBCHashRemoveAll(PVLIBSZHASH hash);                 // 0, -1 bad param
-int VLIBCSzHashCount(PVLIBSZHASH hash);                   // keys present
+int VLIBCSzHashCount(PVLIBSZHASH hash);                   // keys present, -1 for NULL
 
 typedef struct _VLIBSZLIST {
   int nItem;      // items in use
@@ -31,6 +32,8 @@ typedef struct _VLIBSZLIST {
 
 PVLIBSZLIST VLIBCSzListAlloc(int capacity);               // NULL on no memory
 void VLIBCSzListFree(PVLIBSZLIST list);
+// Push and Set allocate the list when *list is NULL. Set replaces item index; index == count
+// appends (so Set(0) fills a fresh list).
 int VLIBCSzListPush(PVLIBSZLIST* list, const char* item); // new count, -1 on failure
 int VLIBCSzListSet(PVLIBSZLIST* list, int index, const char* item); // 0, -1 out of range/no memory
 const char* VLIBCSzListGet(PVLIBSZLIST list, int index);  // NULL out of range
