@@ -5,6 +5,8 @@
 #ifndef VORN_TESTS_SUPPORT_SYSLOG_CAPTURE_H
 #define VORN_TESTS_SUPPORT_SYSLOG_CAPTURE_H
 
+#include <syslog.h>
+
 #include <string>
 #include <vector>
 

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <poll.h>
 #include <signal.h>
+#include <sys/mount.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -125,6 +126,24 @@ RunResult Run(const std::vector<std::string>& argv, const std::string& input, in
   if (WIFEXITED(status)) r.status = WEXITSTATUS(status);
   else if (WIFSIGNALED(status)) r.status = 128 + WTERMSIG(status);
   return r;
+}
+
+ReadOnlyMount::ReadOnlyMount(const std::string& path) : path_(path) {
+  ok_ = mount(path.c_str(), path.c_str(), nullptr, MS_BIND, nullptr) == 0;
+  if (ok_ && mount(nullptr, path.c_str(), nullptr, MS_REMOUNT | MS_BIND | MS_RDONLY, nullptr) != 0) {
+    umount(path.c_str());
+    ok_ = false;
+  }
+}
+ReadOnlyMount::~ReadOnlyMount() {
+  if (ok_) umount2(path_.c_str(), MNT_DETACH);
+}
+
+SelfBindMount::SelfBindMount(const std::string& path) : path_(path) {
+  ok_ = mount(path.c_str(), path.c_str(), nullptr, MS_BIND, nullptr) == 0;
+}
+SelfBindMount::~SelfBindMount() {
+  if (ok_) umount2(path_.c_str(), MNT_DETACH);
 }
 
 std::string SourceDir() {

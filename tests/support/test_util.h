@@ -35,6 +35,35 @@ struct RunResult {
 RunResult Run(const std::vector<std::string>& argv, const std::string& input = "",
               int timeoutSec = 60);
 
+// Inside the sandbox (root, private mount namespace): makes path a read-only bind mount of itself
+// for the object's lifetime, so writes under it fail with EROFS even for root.
+class ReadOnlyMount {
+ public:
+  explicit ReadOnlyMount(const std::string& path);
+  ~ReadOnlyMount();
+  ReadOnlyMount(const ReadOnlyMount&) = delete;
+  ReadOnlyMount& operator=(const ReadOnlyMount&) = delete;
+  bool ok() const { return ok_; }
+
+ private:
+  std::string path_;
+  bool ok_ = false;
+};
+
+// Binds path onto itself, so that rename() or unlink() of it fails with EBUSY.
+class SelfBindMount {
+ public:
+  explicit SelfBindMount(const std::string& path);
+  ~SelfBindMount();
+  SelfBindMount(const SelfBindMount&) = delete;
+  SelfBindMount& operator=(const SelfBindMount&) = delete;
+  bool ok() const { return ok_; }
+
+ private:
+  std::string path_;
+  bool ok_ = false;
+};
+
 std::string SourceDir();  // $VORN_SOURCE_DIR (the project's source tree)
 std::string BinaryDir();  // $VORN_BINARY_DIR (the build tree)
 bool InSandbox();         // $VORN_SANDBOX is set: private namespaces, root
