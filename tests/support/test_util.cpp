@@ -146,6 +146,28 @@ SelfBindMount::~SelfBindMount() {
   if (ok_) umount2(path_.c_str(), MNT_DETACH);
 }
 
+bool SetPeerLink(const std::string& ifname, bool up, std::string* why) {
+  std::string var = "VORN_PEER_" + ifname + "_PID";
+  const char* pid = std::getenv(var.c_str());
+  if (!pid) {
+    if (why) *why = var + " is not set (sandbox without --veth " + ifname + "?)";
+    return false;
+  }
+  RunResult r = Run({"/usr/bin/nsenter", "-t", pid, "-n", "/usr/sbin/ip", "link", "set", ifname,
+                     up ? "up" : "down"});
+  if (r.status != 0) {
+    if (why) *why = "ip link set on the peer failed: " + r.err;
+    return false;
+  }
+  const std::string want = up ? "1\n" : "0\n";
+  for (int i = 0; i < 100; ++i) {
+    if (ReadFile("/sys/class/net/" + ifname + "/carrier") == want) return true;
+    usleep(20000);
+  }
+  if (why) *why = "the carrier of " + ifname + " did not follow";
+  return false;
+}
+
 std::string SourceDir() {
   const char* p = std::getenv("VORN_SOURCE_DIR");
   return p ? p : "";

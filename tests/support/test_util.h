@@ -64,6 +64,10 @@ class SelfBindMount {
   bool ok_ = false;
 };
 
+// Inside a sandbox started with --veth NAME: sets the peer host's end of NAME up or down and waits
+// (2 s at most) until the carrier of our end follows. False, with the reason in *why, otherwise.
+bool SetPeerLink(const std::string& ifname, bool up, std::string* why = nullptr);
+
 std::string SourceDir();  // $VORN_SOURCE_DIR (the project's source tree)
 std::string BinaryDir();  // $VORN_BINARY_DIR (the build tree)
 bool InSandbox();         // $VORN_SANDBOX is set: private namespaces, root

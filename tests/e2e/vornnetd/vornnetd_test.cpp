@@ -17,7 +17,7 @@
 #include <string>
 #include <vector>
 
-#include "daemon_process.h"
+#include "support/daemon_process.h"
 #include "support/syslog_capture.h"
 #include "support/test_util.h"
 #include "vornplatform/dbus.h"

@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "daemon_process.h"
+#include "support/daemon_process.h"
 #include "support/test_util.h"
 #include "vornwireless/dbus_net/net_client.h"
 

@@ -19,7 +19,7 @@
 #include <thread>
 #include <vector>
 
-#include "daemon_process.h"
+#include "support/daemon_process.h"
 #include "support/syslog_capture.h"
 #include "support/test_util.h"
 

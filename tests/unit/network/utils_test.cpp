@@ -23,19 +23,9 @@ namespace {
 const char kFile[] = "network/utils.cpp";
 const char kEthtool[] = "/usr/bin/ethtool";
 
-// Brings the peer host's end of the veth eth0 down or up.
 void SetPeer(bool up) {
-  const char* pid = std::getenv("VORN_PEER_eth0_PID");
-  ASSERT_NE(pid, nullptr);
-  auto r = vorntest::Run({"/usr/bin/nsenter", "-t", pid, "-n", "/usr/sbin/ip", "link", "set",
-                          "eth0", up ? "up" : "down"});
-  ASSERT_EQ(r.status, 0) << r.err;
-  // The carrier of our end follows at once; wait for the kernel to say so.
-  for (int i = 0; i < 100; ++i) {
-    if (vorntest::ReadFile("/sys/class/net/eth0/carrier") == (up ? "1\n" : "0\n")) return;
-    usleep(20000);
-  }
-  FAIL() << "carrier did not follow";
+  std::string why;
+  ASSERT_TRUE(vorntest::SetPeerLink("eth0", up, &why)) << why;
 }
 
 Json::Value Record(std::string const& ifname, std::string const& klass,

@@ -12,16 +12,8 @@
 namespace {
 
 void SetPeer(bool up) {
-  const char* pid = std::getenv("VORN_PEER_eth0_PID");
-  ASSERT_NE(pid, nullptr);
-  auto r = vorntest::Run({"/usr/bin/nsenter", "-t", pid, "-n", "/usr/sbin/ip", "link", "set",
-                          "eth0", up ? "up" : "down"});
-  ASSERT_EQ(r.status, 0) << r.err;
-  for (int i = 0; i < 100; ++i) {
-    if (vorntest::ReadFile("/sys/class/net/eth0/carrier") == (up ? "1\n" : "0\n")) return;
-    usleep(20000);
-  }
-  FAIL() << "carrier did not follow";
+  std::string why;
+  ASSERT_TRUE(vorntest::SetPeerLink("eth0", up, &why)) << why;
 }
 
 const char kIfcfgDir[] = "/etc/sysconfig/network-scripts";

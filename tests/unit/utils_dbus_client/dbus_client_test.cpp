@@ -7,7 +7,7 @@
 
 #include <string>
 
-#include "daemon_process.h"
+#include "support/daemon_process.h"
 #include "support/syslog_capture.h"
 #include "vornwireless/dbus_net/net_client.h"
 

@@ -1,4 +1,4 @@
-#include "daemon_process.h"
+#include "support/daemon_process.h"
 
 #include <signal.h>
 #include <spawn.h>
@@ -24,6 +24,13 @@ int StatusOf(int raw) {
 }
 
 }  // namespace
+
+bool NameHasOwner(const std::string& name) {
+  RunResult r =
+      Run({"/usr/bin/gdbus", "call", "--session", "--dest", "org.freedesktop.DBus", "--object-path",
+           "/org/freedesktop/DBus", "--method", "org.freedesktop.DBus.NameHasOwner", name});
+  return r.status == 0 && r.out == "(true,)\n";
+}
 
 pid_t NameOwnerPid(const std::string& name) {
   RunResult r = Run({"/usr/bin/gdbus", "call", "--session", "--dest", "org.freedesktop.DBus",

@@ -1,7 +1,7 @@
 // Runs a D-Bus daemon of ours (vornnetd or a test service) on the test's bus for the length of a
 // test, and asks the bus about names with gdbus.
-#ifndef VORN_TESTS_UNIT_DBUS_NET_DAEMON_PROCESS_H
-#define VORN_TESTS_UNIT_DBUS_NET_DAEMON_PROCESS_H
+#ifndef VORN_TESTS_SUPPORT_DAEMON_PROCESS_H
+#define VORN_TESTS_SUPPORT_DAEMON_PROCESS_H
 
 #include <sys/types.h>
 
@@ -34,6 +34,9 @@ class DaemonProcess {
   int status_ = -1;
 };
 
+// Whether the bus says `name` has an owner (asked with gdbus, independent of our client).
+bool NameHasOwner(const std::string& name);
+// The pid of the owner of `name`, -1 when it has none.
 pid_t NameOwnerPid(const std::string& name);
 
 }  // namespace vorntest
