@@ -762,17 +762,24 @@ int VLIBCFileGetSection(const char* path, const char* name, PVLIBSZHASH* hash) {
   });
 }
 
-int VLIBCFileAddSection(const char* path, const char* name, PVLIBSZHASH hash, const char* fmt) {
+// The arguments of a section writer: a path, a section name and keys a file can hold, a format
+// with two "%s". False with the error register set otherwise.
+bool CheckSectionWrite(const char* path, const char* name, PVLIBSZHASH hash, const char* fmt) {
   if (!HasText(path) || hash == nullptr || !ValidFormat(fmt)) {
     VLIBC_ERR_SET(VLIBC_ERR_BAD_PARAMETER);
-    return -1;
+    return false;
   }
   int code = CheckSectionName(name);
   if (code == 0) code = CheckHash(hash);
   if (code != 0) {
     VLIBC_ERR_SET(code);
-    return -1;
+    return false;
   }
+  return true;
+}
+
+int VLIBCFileAddSection(const char* path, const char* name, PVLIBSZHASH hash, const char* fmt) {
+  if (!CheckSectionWrite(path, name, hash, fmt)) return -1;
   return NoThrow(-1, [&]() -> int {
     std::vector<std::string> lines;
     if (LoadLines(path, true, &lines) != 0) return -1;
@@ -783,16 +790,7 @@ int VLIBCFileAddSection(const char* path, const char* name, PVLIBSZHASH hash, co
 }
 
 int VLIBCFileSetSection(const char* path, const char* name, PVLIBSZHASH hash, const char* fmt) {
-  if (!HasText(path) || hash == nullptr || !ValidFormat(fmt)) {
-    VLIBC_ERR_SET(VLIBC_ERR_BAD_PARAMETER);
-    return -1;
-  }
-  int code = CheckSectionName(name);
-  if (code == 0) code = CheckHash(hash);
-  if (code != 0) {
-    VLIBC_ERR_SET(code);
-    return -1;
-  }
+  if (!CheckSectionWrite(path, name, hash, fmt)) return -1;
   return NoThrow(-1, [&]() -> int {
     std::vector<std::string> lines;
     if (LoadLines(path, true, &lines) != 0) return -1;

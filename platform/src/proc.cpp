@@ -256,15 +256,10 @@ int VLIBCExec(const char* path, const char* a1, const char* a2, const char* a3, 
   });
 }
 
-int VLIBCExecl(const char* path, int flags, ...) {
-  if (!HasText(path)) {
-    VLIBC_ERR_SET(VLIBC_ERR_BAD_PARAMETER);
-    return -1;
-  }
-  std::vector<const char*> args;
-  va_list ap;
-  va_start(ap, flags);
-  const int rc = NoThrow(-1, [&]() -> int {
+// argv of a variadic call: path, then the NULL-ended arguments of ap. 0, or -1 (error set).
+int CollectArgs(const char* path, va_list ap, std::vector<const char*>* out) {
+  return NoThrow(-1, [&]() -> int {
+    std::vector<const char*>& args = *out;
     args.push_back(path);
     for (;;) {
       const char* a = va_arg(ap, const char*);
@@ -277,6 +272,17 @@ int VLIBCExecl(const char* path, int flags, ...) {
     }
     return 0;
   });
+}
+
+int VLIBCExecl(const char* path, int flags, ...) {
+  if (!HasText(path)) {
+    VLIBC_ERR_SET(VLIBC_ERR_BAD_PARAMETER);
+    return -1;
+  }
+  std::vector<const char*> args;
+  va_list ap;
+  va_start(ap, flags);
+  const int rc = CollectArgs(path, ap, &args);
   va_end(ap);
   if (rc != 0) return -1;
   return NoThrow(-1, [&]() -> int { return RunArgs(path, args); });
@@ -315,17 +321,8 @@ FILE* VLIBCPopen(const char* path, const char* mode, ...) {
   std::vector<const char*> args;
   va_list ap;
   va_start(ap, mode);
-  const int rc = NoThrow(-1, [&]() -> int {
-    args.push_back(path);
-    for (;;) {
-      const char* a = va_arg(ap, const char*);
-      if (a == nullptr) break;
-      if (static_cast<int>(args.size()) >= kMaxArgs) {
-        VLIBC_ERR_SET(VLIBC_ERR_TOO_LONG);
-        return -1;
-      }
-      args.push_back(a);
-    }
+  int rc = CollectArgs(path, ap, &args);
+  if (rc == 0) rc = NoThrow(-1, [&]() -> int {
     args.push_back(nullptr);
     return 0;
   });
