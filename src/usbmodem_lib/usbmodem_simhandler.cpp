@@ -25,7 +25,7 @@ const int kWaitRounds = 10;
 const char* const USBModem_SIMHandler::kInfoPathFormat = "/tmp/usbmodem.info%d";
 
 USBModem_SIMHandler::USBModem_SIMHandler()
-    : _PINStatus(SIM_STATUS_UNKNOWN),
+    : _PINStatus(SIM_UNKNOWN),
       _signal(0),
       _defaultAPNList(Json::arrayValue) {}
 
@@ -69,22 +69,22 @@ int USBModem_SIMHandler::InitHandler(unsigned int const& ifid) {
   }
   UpdateSIMStatus();
   switch (_PINStatus) {
-    case SIM_STATUS_READY:
+    case SIM_READY:
       if (InitAfterUnlocked() < 0) {
         VORN_LOG(LOG_ERR, "failed on sim init after pin locked");
         return -1;
       }
       return 0;
-    case SIM_STATUS_PIN:
-    case SIM_STATUS_PUK:
-    case SIM_STATUS_FAILURE:
+    case SIM_PIN:
+    case SIM_PUK:
+    case SIM_FAILURE:
       // Waits for its PIN or PUK; a failed SIM stays listed as no_sim.
       return 0;
-    case SIM_STATUS_MUTE:
+    case SIM_MUTE:
       VORN_LOG(LOG_ERR, "Warning: sim mute before handler init");
       return -1;
-    case SIM_STATUS_BUSY:
-    case SIM_STATUS_ERROR:
+    case SIM_BUSY:
+    case SIM_ERROR:
       VORN_LOG(LOG_ERR, "Warning: sim error or busy detected when init");
       return -1;
     default:
@@ -103,14 +103,14 @@ int USBModem_SIMHandler::SendModemCommand(std::string const& cmd, std::string& r
 
 void USBModem_SIMHandler::UpdateSIMStatus() {
   if (!_atif) {
-    _PINStatus = SIM_STATUS_UNKNOWN;
+    _PINStatus = SIM_UNKNOWN;
     return;
   }
   std::string reply;
   if (SendModemCommand(_atif->GetATCommandQuarySIMStatus(), reply) != 0) {
-    _PINStatus = SIM_STATUS_UNKNOWN;
+    _PINStatus = SIM_UNKNOWN;
   } else if (reply.empty()) {
-    _PINStatus = SIM_STATUS_MUTE;
+    _PINStatus = SIM_MUTE;
   } else {
     _PINStatus = _atif->ParseRetStringQuarySIMStatus(reply);
   }
@@ -119,17 +119,17 @@ void USBModem_SIMHandler::UpdateSIMStatus() {
 std::string USBModem_SIMHandler::GetPINStatus(bool& error) {
   UpdateSIMStatus();
   switch (_PINStatus) {
-    case SIM_STATUS_READY:
+    case SIM_READY:
       return "ready";
-    case SIM_STATUS_PIN:
+    case SIM_PIN:
       return "pin_protect";
-    case SIM_STATUS_PUK:
+    case SIM_PUK:
       return "puk_protect";
-    case SIM_STATUS_MUTE:
+    case SIM_MUTE:
       return "mute";
-    case SIM_STATUS_BUSY:
-    case SIM_STATUS_ERROR:
-    case SIM_STATUS_FAILURE:
+    case SIM_BUSY:
+    case SIM_ERROR:
+    case SIM_FAILURE:
       return "no_sim";
     default:
       VORN_LOG(LOG_ERR, "error value on _PINStatus, %d", _PINStatus);
@@ -142,11 +142,11 @@ int USBModem_SIMHandler::InitAfterUnlocked() {
   bool error = false;
   for (int round = 1; round <= kWaitRounds; ++round) {
     GetPINStatus(error);
-    if (_PINStatus == SIM_STATUS_READY) break;
+    if (_PINStatus == SIM_READY) break;
     VORN_LOG(LOG_ERR, "Wait for sim ready after pin unlocked (%d)", round);
     sleep(1);
   }
-  if (_PINStatus != SIM_STATUS_READY || error) {
+  if (_PINStatus != SIM_READY || error) {
     VORN_LOG(LOG_ERR, "pin unlocked, but sim card is not ready, or has error status");
     return -1;
   }
@@ -250,8 +250,8 @@ int USBModem_SIMHandler::ChangePINWithPUK(std::string const& puk, std::string co
     return -1;
   }
   // Wrong PINs move the SIM to PUK on its own: a stale cache is read again before refusing.
-  if (_PINStatus != SIM_STATUS_PUK) UpdateSIMStatus();
-  if (_PINStatus != SIM_STATUS_PUK) {
+  if (_PINStatus != SIM_PUK) UpdateSIMStatus();
+  if (_PINStatus != SIM_PUK) {
     VORN_LOG(LOG_ERR, "Cannot set PUK at this SIM stat");
     return -1;
   }
@@ -290,8 +290,8 @@ int USBModem_SIMHandler::ChangePINEnable(std::string const& pin, bool enable) {
     VORN_LOG(LOG_ERR, "error on modem cmd: enable pin protection: refused characters in the PIN");
     return -1;
   }
-  if (_PINStatus != SIM_STATUS_READY) UpdateSIMStatus();
-  if (_PINStatus != SIM_STATUS_READY) {
+  if (_PINStatus != SIM_READY) UpdateSIMStatus();
+  if (_PINStatus != SIM_READY) {
     VORN_LOG(LOG_ERR, "Cannot change enable when SIM is not ready");
     return -1;
   }
@@ -318,8 +318,8 @@ int USBModem_SIMHandler::ChangePIN(std::string const& oldPin, std::string const&
     VORN_LOG(LOG_ERR, "error on modem cmd: change pin: refused characters in the PIN");
     return -1;
   }
-  if (_PINStatus != SIM_STATUS_READY) UpdateSIMStatus();
-  if (_PINStatus != SIM_STATUS_READY) {
+  if (_PINStatus != SIM_READY) UpdateSIMStatus();
+  if (_PINStatus != SIM_READY) {
     VORN_LOG(LOG_ERR, "Cannot change PIN when SIM is not ready");
     return -1;
   }
@@ -359,10 +359,10 @@ int USBModem_SIMHandler::PINSet(std::string const& oldPin, std::string const& ne
 namespace {
 
 bool StatusAllowsAttemptQuery(int status) {
-  return !(status == USBModem_SIMHandler::SIM_STATUS_MUTE ||
-           status == USBModem_SIMHandler::SIM_STATUS_BUSY ||
-           status == USBModem_SIMHandler::SIM_STATUS_ERROR ||
-           status == USBModem_SIMHandler::SIM_STATUS_UNKNOWN);
+  return !(status == SIM_MUTE ||
+           status == SIM_BUSY ||
+           status == SIM_ERROR ||
+           status == SIM_UNKNOWN);
 }
 
 }  // namespace
@@ -422,7 +422,7 @@ std::string TrimBlanks(std::string const& text) {
 }  // namespace
 
 std::string USBModem_SIMHandler::GetIMSI(bool& error) {
-  if (_imsi.empty() && _PINStatus == SIM_STATUS_READY && _atif) {
+  if (_imsi.empty() && _PINStatus == SIM_READY && _atif) {
     std::string const cmd = _atif->GetATCommandGetIMSI();
     std::string reply;
     std::string value;
@@ -445,81 +445,55 @@ std::string USBModem_SIMHandler::GetIMSI(bool& error) {
   return _imsi;
 }
 
+// Asks the modem once for a text that does not change while the SIM stays (vendor, product,
+// default ISP and APN) and keeps it in cache; a failure sets the error flag and keeps nothing.
+void USBModem_SIMHandler::QueryCached(std::string const& cmd,
+                                      int (USBModem_ATIF::*parse)(std::string const&, std::string&),
+                                      char const* what, std::string& cache, bool& error) {
+  std::string reply;
+  std::string value;
+  if (SendModemCommand(cmd, reply) != 0) {
+    VORN_LOG(LOG_ERR, "error on sending commmand %s", cmd.c_str());
+    error = true;
+  } else if ((_atif.get()->*parse)(reply, value) != 0) {
+    VORN_LOG(LOG_ERR, "error on parsing %s, ret (%s)", what, reply.c_str());
+    error = true;
+  } else {
+    cache = value;
+  }
+}
+
 std::string USBModem_SIMHandler::GetVendorName(bool& error) {
   if (_vendorName.empty() && _atif) {
-    std::string const cmd = _atif->GetATCommandGetVendorName();
-    std::string reply;
-    std::string value;
-    if (SendModemCommand(cmd, reply) != 0) {
-      VORN_LOG(LOG_ERR, "error on sending commmand %s", cmd.c_str());
-      error = true;
-    } else if (_atif->ParseRetStringDefaultFormat(reply, value) != 0) {
-      VORN_LOG(LOG_ERR, "error on parsing vendor name, ret (%s)", reply.c_str());
-      error = true;
-    } else {
-      _vendorName = value;
-    }
+    QueryCached(_atif->GetATCommandGetVendorName(), &USBModem_ATIF::ParseRetStringDefaultFormat, "vendor name", _vendorName, error);
   }
   return _vendorName;
 }
 
 std::string USBModem_SIMHandler::GetProductName(bool& error) {
   if (_productName.empty() && _atif) {
-    std::string const cmd = _atif->GetATCommandGetProductName();
-    std::string reply;
-    std::string value;
-    if (SendModemCommand(cmd, reply) != 0) {
-      VORN_LOG(LOG_ERR, "error on sending commmand %s", cmd.c_str());
-      error = true;
-    } else if (_atif->ParseRetStringDefaultFormat(reply, value) != 0) {
-      VORN_LOG(LOG_ERR, "error on parsing product name, ret (%s)", reply.c_str());
-      error = true;
-    } else {
-      _productName = value;
-    }
+    QueryCached(_atif->GetATCommandGetProductName(), &USBModem_ATIF::ParseRetStringDefaultFormat, "product name", _productName, error);
   }
   return _productName;
 }
 
 std::string USBModem_SIMHandler::GetDefaultISP(bool& error) {
   if (_defaultISP.empty() && _atif) {
-    std::string const cmd = _atif->GetATCommandGetDefaultISP();
-    std::string reply;
-    std::string value;
-    if (SendModemCommand(cmd, reply) != 0) {
-      VORN_LOG(LOG_ERR, "error on sending commmand %s", cmd.c_str());
-      error = true;
-    } else if (_atif->ParseRetStringDefaultISP(reply, value) != 0) {
-      VORN_LOG(LOG_ERR, "error on parsing default isp, ret (%s)", reply.c_str());
-      error = true;
-    } else {
-      _defaultISP = value;
-    }
+    QueryCached(_atif->GetATCommandGetDefaultISP(), &USBModem_ATIF::ParseRetStringDefaultISP, "default isp", _defaultISP, error);
   }
   return _defaultISP;
 }
 
 std::string USBModem_SIMHandler::GetDefaultAPN(bool& error) {
   if (_defaultAPN.empty() && _atif) {
-    std::string const cmd = _atif->GetATCommandGetDefaultAPN();
-    std::string reply;
-    std::string value;
-    if (SendModemCommand(cmd, reply) != 0) {
-      VORN_LOG(LOG_ERR, "error on sending commmand %s", cmd.c_str());
-      error = true;
-    } else if (_atif->ParseRetStringDefaultAPN(reply, value) != 0) {
-      VORN_LOG(LOG_ERR, "error on parsing default apn, ret (%s)", reply.c_str());
-      error = true;
-    } else {
-      _defaultAPN = value;
-    }
+    QueryCached(_atif->GetATCommandGetDefaultAPN(), &USBModem_ATIF::ParseRetStringDefaultAPN, "default apn", _defaultAPN, error);
   }
   return _defaultAPN;
 }
 
 Json::Value USBModem_SIMHandler::GetDefaultAPNList(bool& error) {
   bool const cached = _defaultAPNList.isArray() && _defaultAPNList.size() > 0;
-  if (!cached && _PINStatus != SIM_STATUS_MUTE && _atif) {
+  if (!cached && _PINStatus != SIM_MUTE && _atif) {
     std::string const cmd = _atif->GetATCommandGetDefaultAPN();
     std::string reply;
     Json::Value list(Json::arrayValue);
@@ -537,7 +511,7 @@ Json::Value USBModem_SIMHandler::GetDefaultAPNList(bool& error) {
 }
 
 std::string USBModem_SIMHandler::GetRoaming(bool& error) {
-  if (_PINStatus != SIM_STATUS_MUTE && _atif) {
+  if (_PINStatus != SIM_MUTE && _atif) {
     std::string const cmd = _atif->GetATCommandGetRoaming();
     std::string reply;
     std::string value;
@@ -555,7 +529,7 @@ std::string USBModem_SIMHandler::GetRoaming(bool& error) {
 }
 
 int USBModem_SIMHandler::GetSignalQuality(bool& error) {
-  if (_PINStatus == SIM_STATUS_READY && _atif) {
+  if (_PINStatus == SIM_READY && _atif) {
     _signal = 0;
     std::string const cmd = _atif->GetATCommandGetRSSI();
     std::string reply;
@@ -587,7 +561,7 @@ Json::Value USBModem_SIMHandler::GetSimInfo(bool& error) {
 Json::Value USBModem_SIMHandler::GetUSBModemData(bool& error) {
   std::string const status = GetPINStatus(error);
   Json::Value data(Json::objectValue);
-  if (_PINStatus == SIM_STATUS_READY || _PINStatus == SIM_STATUS_MUTE) {
+  if (_PINStatus == SIM_READY || _PINStatus == SIM_MUTE) {
     data["product"] = GetProductName(error);
     data["vendor"] = GetVendorName(error);
     data["signal"] = GetSignalQuality(error);

@@ -220,7 +220,7 @@ Json::Value USBModem_SIMHandler::GetProfile(bool& error) {
   static const char* const kStringKeys[] = {"apn", "number", "user", "pass",
                                             "IMSI", "location", "isp"};
   Json::Value profile(Json::objectValue);
-  bool const readable = _PINStatus == SIM_STATUS_READY || _PINStatus == SIM_STATUS_MUTE;
+  bool const readable = _PINStatus == SIM_READY || _PINStatus == SIM_MUTE;
   for (const char* key : kStringKeys) {
     std::string value;
     if (readable) {
@@ -289,8 +289,8 @@ int USBModem_SIMHandler::SetProfile(Json::Value const& value) {
 
 int USBModem_SIMHandler::CheckAndWriteAPN(std::string const& number, std::string const& apn) {
   // The cached status may be stale (a one-port dongle reads mute while it dials).
-  if (_PINStatus != SIM_STATUS_READY) UpdateSIMStatus();
-  if (_PINStatus != SIM_STATUS_READY) {
+  if (_PINStatus != SIM_READY) UpdateSIMStatus();
+  if (_PINStatus != SIM_READY) {
     VORN_LOG(LOG_ERR, "this shouldn't call if pin status is not ready (%d)", _PINStatus);
     return -1;
   }

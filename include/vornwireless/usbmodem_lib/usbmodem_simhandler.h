@@ -21,6 +21,8 @@
 #include <memory>
 #include <string>
 
+#include "vornwireless/usbmodem_lib/usbmodem_atif.h"
+
 namespace vornwireless {
 namespace usbmodem_lib {
 
@@ -29,17 +31,7 @@ class USBModem_DeviceNodeHandler;
 
 class USBModem_SIMHandler {
  public:
-  // SIM status values (_PINStatus).
-  enum {
-    SIM_STATUS_READY = 0,
-    SIM_STATUS_PIN = 1,
-    SIM_STATUS_PUK = 2,
-    SIM_STATUS_MUTE = 3,
-    SIM_STATUS_BUSY = 4,
-    SIM_STATUS_ERROR = 5,
-    SIM_STATUS_FAILURE = 6,
-    SIM_STATUS_UNKNOWN = 7,
-  };
+  // _PINStatus holds a SIM_STATUS value of the dialect (SIM_READY ... SIM_UNKNOWN).
 
   // Where profiles live and what they hold.
   static const char* const kProfileDir;         // "/var/lib/usbmodem"
@@ -127,6 +119,9 @@ class USBModem_SIMHandler {
 
  private:
   int SendModemCommand(std::string const& cmd, std::string& reply);
+  void QueryCached(std::string const& cmd,
+                   int (USBModem_ATIF::*parse)(std::string const&, std::string&), char const* what,
+                   std::string& cache, bool& error);
 
   int _PINStatus;
   std::string _imsi;

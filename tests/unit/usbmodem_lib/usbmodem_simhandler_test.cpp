@@ -19,6 +19,7 @@
 #include "vornwireless/usbmodem_lib/usbmodem_atif.h"
 
 using vornwireless::usbmodem_lib::USBModem_SIMHandler;
+using namespace vornwireless::usbmodem_lib;  // SIM_STATUS values
 using vorntest::LogLine;
 using vorntest::ReadFile;
 using vorntest::SyslogCapture;
@@ -127,7 +128,7 @@ class SimHandlerTest : public ::testing::Test {
   void InitReady(Dongle& dongle, USBModem_SIMHandler& h) {
     ASSERT_TRUE(dongle.ready());
     ASSERT_EQ(0, h.InitHandler(kIfid));
-    ASSERT_EQ(USBModem_SIMHandler::SIM_STATUS_READY, h.GetPINStatusValue());
+    ASSERT_EQ(SIM_READY, h.GetPINStatusValue());
   }
 };
 
@@ -207,7 +208,7 @@ TEST_F(SimHandlerTest, InitOfPukLockedAndFailedSims) {
     ASSERT_TRUE(dongle.ready());
     USBModem_SIMHandler h;
     EXPECT_EQ(0, h.InitHandler(kIfid));
-    EXPECT_EQ(USBModem_SIMHandler::SIM_STATUS_FAILURE, h.GetPINStatusValue());
+    EXPECT_EQ(SIM_FAILURE, h.GetPINStatusValue());
     bool error = false;
     EXPECT_EQ("no_sim", h.GetPINStatus(error));
     EXPECT_FALSE(error);
@@ -239,7 +240,7 @@ TEST_F(SimHandlerTest, InitOfBusyOrErroneousSimFails) {
     SyslogCapture log;
     USBModem_SIMHandler h;
     EXPECT_EQ(-1, h.InitHandler(kIfid));
-    EXPECT_EQ(USBModem_SIMHandler::SIM_STATUS_ERROR, h.GetPINStatusValue());
+    EXPECT_EQ(SIM_ERROR, h.GetPINStatusValue());
     EXPECT_TRUE(log.HasOnce(LOG_ERR,
                             LogLine(kSimFile, "Warning: sim error or busy detected when init")))
         << log.Dump();
@@ -255,7 +256,7 @@ TEST_F(SimHandlerTest, InitWithSilentDongleReadsMuteAndFails) {
   SyslogCapture log;
   USBModem_SIMHandler h;
   EXPECT_EQ(-1, h.InitHandler(kIfid));
-  EXPECT_EQ(USBModem_SIMHandler::SIM_STATUS_MUTE, h.GetPINStatusValue());
+  EXPECT_EQ(SIM_MUTE, h.GetPINStatusValue());
   EXPECT_TRUE(log.HasOnce(LOG_ERR, LogLine(kSimFile, "Warning: sim mute before handler init")))
       << log.Dump();
 }
