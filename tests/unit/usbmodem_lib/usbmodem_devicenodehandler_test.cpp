@@ -295,7 +295,7 @@ TEST(DeviceNodeHandler, NodeListIsAskedThreeTimesWithoutDelay) {
   USBModem_DeviceNodeHandler h(d.id());
   auto start = std::chrono::steady_clock::now();
   EXPECT_EQ(-1, h.InitHandler(d.info(), "AT+CPIN?"));
-  EXPECT_LT(Seconds(start), 0.5);
+  EXPECT_LT(Seconds(start), 3.0);  // no pause (the shortest would be 5 s)
   for (int i = 1; i <= 3; ++i) {
     EXPECT_TRUE(log.HasOnce(LOG_ERR, LogLine(kFile, "No respond on setting device node list, wait 1 sec [" +
                                                         std::to_string(i) + "]")))
@@ -702,7 +702,7 @@ TEST(DeviceNodeHandler, MultiNodeDongleSplitsConnectAndQueryNodeAtInit) {
   EXPECT_EQ(0, h.GetConnectNode(node));
   EXPECT_EQ(d.Node(0), node);
   h.ReleaseConnectNode();
-  EXPECT_LT(Seconds(start), 1.0);
+  EXPECT_LT(Seconds(start), 3.0);  // no pause (the shortest would be 5 s)
   EXPECT_EQ(d.Node(0), peer.ConnectNode());
   EXPECT_EQ(d.Node(1), peer.QueryNode());
   ASSERT_EQ(0, h.SendCommand("AT+CPIN?", reply));
@@ -779,7 +779,7 @@ TEST(DeviceNodeHandler, OnePortDongleAtRestLendsItsNodeWithoutClosingAnything) {
   std::string node;
   auto start = std::chrono::steady_clock::now();
   EXPECT_EQ(0, h.GetConnectNode(node));
-  EXPECT_LT(Seconds(start), 1.0);
+  EXPECT_LT(Seconds(start), 3.0);  // no pause (the shortest would be 5 s)
   EXPECT_EQ(d.Node(0), node);
   EXPECT_EQ(d.Node(0), peer.ConnectNode());
   EXPECT_TRUE(peer.Nodes().empty());
@@ -910,7 +910,7 @@ TEST_F(HandOverUnderTimeWarp, OnePortNodeGoesToTheDiallerAndComesBack) {
   EXPECT_EQ(0, h.GetConnectNode(node));
   double took = Seconds(start);
   EXPECT_GE(took, 10.0);
-  EXPECT_LT(took, 19.0);  // one pause, not two (a real-time hiccup counts twenty times here)
+  EXPECT_LT(took, 19.0);  // one pause, not two (a real-time hiccup counts five times here)
   EXPECT_EQ(d.Node(0), node);
   EXPECT_EQ(d.Node(0), peer.ConnectNode());
   EXPECT_EQ("", peer.QueryNode());
@@ -931,7 +931,7 @@ TEST_F(HandOverUnderTimeWarp, OnePortNodeGoesToTheDiallerAndComesBack) {
   h.ReleaseConnectNode();
   took = Seconds(start);
   EXPECT_GE(took, 5.0);
-  EXPECT_LT(took, 9.5);
+  EXPECT_LT(took, 9.9);  // one pause of 5 s, not two
   EXPECT_EQ("", peer.ConnectNode());
   EXPECT_EQ(std::vector<std::string>{d.Node(0)}, peer.Nodes());
   ASSERT_EQ(0, h.SendCommand("AT+CPIN?", reply));
@@ -941,7 +941,7 @@ TEST_F(HandOverUnderTimeWarp, OnePortNodeGoesToTheDiallerAndComesBack) {
   // Released twice: nothing more happens and there is no second pause.
   start = std::chrono::steady_clock::now();
   h.ReleaseConnectNode();
-  EXPECT_LT(Seconds(start), 1.0);
+  EXPECT_LT(Seconds(start), 4.0);  // no second pause of 5 s
 }
 
 TEST_F(HandOverUnderTimeWarp, OnePortDongleFallsToItsQueryNodeWhenTheConnectNodeDidNotAnswer) {
@@ -974,13 +974,13 @@ TEST(DeviceNodeHandler, HandOverRunsUnderTheTimeSeam) {
   setenv(kChildEnv, "1", 1);
   auto start = std::chrono::steady_clock::now();
   vorntest::RunResult r = vorntest::Run(
-      {timewarp, "20", "--", self, "--gtest_filter=HandOverUnderTimeWarp.*"}, "", 120);
+      {timewarp, "5", "--", self, "--gtest_filter=HandOverUnderTimeWarp.*"}, "", 120);
   double took = Seconds(start);
   unsetenv(kChildEnv);
   EXPECT_EQ(0, r.status) << r.out << r.err;
   EXPECT_NE(std::string::npos, r.out.find("[  PASSED  ] 2 tests.")) << r.out << r.err;
   EXPECT_EQ(std::string::npos, r.out.find("SKIPPED")) << r.out;
-  EXPECT_LT(took, 10.0);  // 25 s of waits passed in a fraction of that
+  EXPECT_LT(took, 20.0);  // 25 s of waits passed in a fraction of that
 }
 
 // ---------------------------------------------------------------------------------------------
