@@ -37,23 +37,41 @@ std::string ReadFile(const std::string& path) {
   return out.str();
 }
 
-bool WriteFile(const std::string& path, const std::string& content, int mode) {
-  int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, mode);
-  if (fd < 0) return false;
-  const char* p = content.data();
-  std::size_t left = content.size();
+bool WriteAll(int fd, const std::string& data) {
+  const char* p = data.data();
+  std::size_t left = data.size();
   while (left > 0) {
     ssize_t n = write(fd, p, left);
     if (n < 0) {
       if (errno == EINTR) continue;
-      close(fd);
+      if (errno == EAGAIN) {
+        struct pollfd pfd = {fd, POLLOUT, 0};
+        poll(&pfd, 1, 100);
+        continue;
+      }
       return false;
     }
     p += n;
     left -= static_cast<std::size_t>(n);
   }
+  return true;
+}
+
+bool WriteFile(const std::string& path, const std::string& content, int mode) {
+  int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, mode);
+  if (fd < 0) return false;
+  bool ok = WriteAll(fd, content);
   fchmod(fd, static_cast<mode_t>(mode));
-  return close(fd) == 0;
+  return close(fd) == 0 && ok;
+}
+
+bool ReplaceFile(const std::string& path, const std::string& content, int mode) {
+  std::string tmp = path + ".tmp." + std::to_string(getpid());
+  if (!WriteFile(tmp, content, mode) || rename(tmp.c_str(), path.c_str()) != 0) {
+    unlink(tmp.c_str());
+    return false;
+  }
+  return true;
 }
 
 bool Exists(const std::string& path) {

@@ -22,6 +22,10 @@ class TempDir {
 };
 
 std::string ReadFile(const std::string& path);           // "" when unreadable
+// Writes all of data to fd (retrying short writes, EINTR, and EAGAIN on non-blocking fds).
+bool WriteAll(int fd, const std::string& data);
+// Writes content next to path and renames it over path, so a reader sees old or new, never half.
+bool ReplaceFile(const std::string& path, const std::string& content, int mode = 0644);
 bool WriteFile(const std::string& path, const std::string& content, int mode = 0644);
 bool Exists(const std::string& path);
 int FileMode(const std::string& path);                   // st_mode & 07777, -1 when missing
