@@ -30,7 +30,7 @@ const char kUsage[] =
     "  gateway list [--type TYPE] | JSON          the gateway list, in priority order\n"
     "  gateway get IFNAME [--type TYPE] | JSON    one interface's entry\n"
     "  gateway add JSON | --ifname IF [--type TYPE] [--priority N] [--gateway ADDR]\n"
-    "                     [--dns ADDR] [--class CLASS]\n"
+    "                     [--dns ADDR] [--class CLASS]    an absent value keeps the stored one\n"
     "  gateway del JSON | --ifname IF [--type TYPE]\n"
     "  gateway set-slave JSON | --ifname IF [--type TYPE] --slave true|false\n"
     "  gateway copy JSON | --from IF --to IF [--type TYPE] [--delete-source]\n"
@@ -186,7 +186,7 @@ int Gateway(NetClient& client, std::vector<std::string> const& args) {
       request["priority"] = static_cast<int>(p);
       request["gateway"] = Str(f, "gateway", "NULL");
       request["dns"] = Str(f, "dns", "NULL");
-      request["class"] = Str(f, "class", "ethernet");
+      request["class"] = Str(f, "class", "NULL");
     }
     if (client.AddGatewayData(request) < 0) return Fail(client, "gateway add");
     return 0;

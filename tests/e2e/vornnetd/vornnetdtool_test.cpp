@@ -81,7 +81,7 @@ TEST_F(ToolAgainstRecorder, GatewayCommandsBuildTheirRequestsFromFlags) {
            "gateway": "10.0.0.1", "dns": "10.0.0.53", "class": "ethernet"})"},
       {{"gateway", "add", "--ifname", "ppp0"},
        R"({"method": "ADD_GATEWAY_DATA", "type": "GTYPE_V4", "ifname": "ppp0", "priority": -1,
-           "gateway": "NULL", "dns": "NULL", "class": "ethernet"})"},
+           "gateway": "NULL", "dns": "NULL", "class": "NULL"})"},
       {{"gateway", "del", "eth0", "--type", "v6"},
        R"({"method": "DEL_GATEWAY_DATA", "type": "GTYPE_V6", "ifname": "eth0"})"},
       {{"gateway", "set-slave", "--ifname", "eth1", "--slave", "true"},
