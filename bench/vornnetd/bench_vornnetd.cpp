@@ -1,14 +1,17 @@
 // bench_vornnetd: figures of the network daemon on the current session bus (run it inside the
 // sandbox through bench/vornnetd/run). Prints; asserts nothing.
 //
-//   bench_vornnetd --daemon PATH [--calls N] [--starts N] [--label TEXT]
+//   bench_vornnetd --daemon PATH [--calls N] [--starts N] [--label TEXT] [--gateways N]
 //
 // 1. start-up: time from posix_spawn of PATH to com.vornlink.net having an owner, --starts times;
 // 2. memory: RSS, PSS and private dirty pages of the idle daemon (/proc/PID/smaps_rollup);
 // 3. round trips, --calls each (default 20000, after 1000 warm-up calls), p50/p90/p99/max:
 //    org.freedesktop.DBus.Peer.Ping to the daemon (answered by the bus library, no handler),
 //    GetGatewayDataByInterface on the raw connection, and the same through NetClient (JSON
-//    written and parsed on the client side too).
+//    written and parsed on the client side too);
+// 4. with --gateways N (the real daemon, in a sandbox with --veth eth0): N gateway entries are
+//    added (eth0 first, so that each add's refresh of the default route succeeds at once), then
+//    GetGatewayListData of the whole list is timed against Peer.Ping, interleaved.
 #include <gio/gio.h>
 #include <signal.h>
 #include <spawn.h>
@@ -172,16 +175,65 @@ void HandlerAlone(int calls) {
   PrintStats("handler alone, in-process (module answering)", Summarise(us), us.size());
 }
 
+// Fills the IPv4 gateway list with n entries and times GetGatewayListData against the bus floor.
+void GatewayList(int n, int calls) {
+  vornnetwork::dbus::NetClient client;
+  auto t0 = Clock::now();
+  for (int i = 0; i < n; ++i) {
+    Json::Value request(Json::objectValue);
+    request["type"] = "GTYPE_V4";
+    request["ifname"] = i == 0 ? std::string("eth0") : "uplink" + std::to_string(i);
+    request["priority"] = -1;
+    request["gateway"] = i == 0 ? std::string("10.200.1.1") : "10.77." + std::to_string(i) + ".1";
+    request["dns"] = "10.77.0." + std::to_string(i % 250 + 1);
+    request["class"] = "wan";
+    if (client.AddGatewayData(request) != 0) std::printf("  add %d failed\n", i);
+  }
+  double addMs = std::chrono::duration<double, std::milli>(Clock::now() - t0).count();
+  Json::Value request(Json::objectValue), result;
+  request["type"] = "GTYPE_V4";
+  client.GetGatewayListData(request, result);
+  std::printf("gateway list: %d adds in %.1f ms (%.2f ms each, file writes and one route each); "
+              "the list holds %u entries\n",
+              n, addMs, addMs / n, result.size());
+  std::string text = "{\"type\":\"GTYPE_V4\"}";
+  auto ping = [] { return RawCall("org.freedesktop.DBus.Peer", "Ping", nullptr); };
+  auto list = [&text] {
+    return RawCall(kName, "GetGatewayListData", g_variant_new("(s)", text.c_str()));
+  };
+  std::function<bool()> kinds[] = {ping, list};
+  std::vector<double> us[2];
+  int failures = 0;
+  for (int i = -200; i < calls; ++i) {
+    for (int k = 0; k < 2; ++k) {
+      auto c0 = Clock::now();
+      bool ok = kinds[k]();
+      double d = std::chrono::duration<double, std::micro>(Clock::now() - c0).count();
+      if (i < 0) continue;
+      if (!ok && k == 1) ++failures;
+      us[k].push_back(d);
+    }
+  }
+  Stats ps = Summarise(us[0]), ls = Summarise(us[1]);
+  std::printf("round trips with %d entries (interleaved, %d each after 200 warm-up rounds):\n", n,
+              calls);
+  PrintStats("Peer.Ping (bus floor)", ps, us[0].size());
+  PrintStats("GetGatewayListData (raw GDBus)", ls, us[1].size());
+  std::printf("    %d of %d answered with an error\n", failures, calls);
+  std::printf("GetGatewayListData over the bus floor at p50: %+.1f %%\n", (ls.p50 / ps.p50 - 1) * 100);
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
   std::string daemon, label;
-  int calls = 20000, starts = 20;
+  int calls = 20000, starts = 20, gateways = 0;
   for (int i = 1; i + 1 < argc; i += 2) {
     if (!std::strcmp(argv[i], "--daemon")) daemon = argv[i + 1];
     if (!std::strcmp(argv[i], "--calls")) calls = std::atoi(argv[i + 1]);
     if (!std::strcmp(argv[i], "--starts")) starts = std::atoi(argv[i + 1]);
     if (!std::strcmp(argv[i], "--label")) label = argv[i + 1];
+    if (!std::strcmp(argv[i], "--gateways")) gateways = std::atoi(argv[i + 1]);
   }
   if (daemon.empty() || !Bus()) {
     std::fprintf(stderr, "usage: bench_vornnetd --daemon PATH (on a session bus)\n");
@@ -244,6 +296,10 @@ int main(int argc, char** argv) {
               (rs.p50 / ps.p50 - 1) * 100, (ts.p50 / ps.p50 - 1) * 100);
   HandlerAlone(calls);
   std::printf("idle memory after the calls:\n%s", Rollup(pid).c_str());
+  if (gateways > 0) {
+    GatewayList(gateways, calls / 4);
+    std::printf("memory with the gateway list:\n%s", Rollup(pid).c_str());
+  }
 
   StopDaemon(pid);
   return 0;
