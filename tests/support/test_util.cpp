@@ -1,5 +1,7 @@
 #include "support/test_util.h"
 
+#include <gtest/gtest.h>
+
 #include <fcntl.h>
 #include <poll.h>
 #include <signal.h>
@@ -164,15 +166,35 @@ SelfBindMount::~SelfBindMount() {
   if (ok_) umount2(path_.c_str(), MNT_DETACH);
 }
 
-bool SetPeerLink(const std::string& ifname, bool up, std::string* why) {
+RunResult Ip(std::vector<std::string> args) {
+  args.insert(args.begin(), "/usr/sbin/ip");
+  return Run(args);
+}
+
+void IpOk(const std::vector<std::string>& args) {
+  RunResult r = Ip(args);
+  if (r.status != 0) {
+    std::string line = "ip";
+    for (auto const& a : args) line += " " + a;
+    ADD_FAILURE() << line << " failed (" << r.status << "): " << r.err;
+  }
+}
+
+RunResult PeerIp(const std::string& ifname, std::vector<std::string> args) {
   std::string var = "VORN_PEER_" + ifname + "_PID";
   const char* pid = std::getenv(var.c_str());
   if (!pid) {
-    if (why) *why = var + " is not set (sandbox without --veth " + ifname + "?)";
-    return false;
+    RunResult r;
+    r.status = -1;
+    r.err = var + " is not set (sandbox without --veth " + ifname + "?)";
+    return r;
   }
-  RunResult r = Run({"/usr/bin/nsenter", "-t", pid, "-n", "/usr/sbin/ip", "link", "set", ifname,
-                     up ? "up" : "down"});
+  args.insert(args.begin(), {"/usr/bin/nsenter", "-t", pid, "-n", "/usr/sbin/ip"});
+  return Run(args);
+}
+
+bool SetPeerLink(const std::string& ifname, bool up, std::string* why) {
+  RunResult r = PeerIp(ifname, {"link", "set", ifname, up ? "up" : "down"});
   if (r.status != 0) {
     if (why) *why = "ip link set on the peer failed: " + r.err;
     return false;

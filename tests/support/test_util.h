@@ -68,6 +68,15 @@ class SelfBindMount {
   bool ok_ = false;
 };
 
+// /usr/sbin/ip with args (never through a shell).
+RunResult Ip(std::vector<std::string> args);
+// The same where the command must succeed: a failure is added to the running test, with the
+// command line and ip's stderr.
+void IpOk(const std::vector<std::string>& args);
+// /usr/sbin/ip on the peer host of veth `ifname` (a sandbox started with --veth NAME); status -1
+// and the reason in err outside one.
+RunResult PeerIp(const std::string& ifname, std::vector<std::string> args);
+
 // Inside a sandbox started with --veth NAME: sets the peer host's end of NAME up or down and waits
 // (2 s at most) until the carrier of our end follows. False, with the reason in *why, otherwise.
 bool SetPeerLink(const std::string& ifname, bool up, std::string* why = nullptr);
