@@ -396,38 +396,32 @@ int RouteModule::IsDatabaseChanged(std::string const& section, std::string const
   return config.GetKeyValue(section, key) != value ? 1 : 0;
 }
 
-int RouteModule::IsGatewayConfigChanged(Json::Value const& request) {
+// Whether the request's `member` ("gateway" or "dns") differs from the database's key of the
+// request's family: 1 changed, 0 not given ("NULL" or absent) or equal, -1 on an unknown type.
+int RouteModule::IsConfigChanged(Json::Value const& request, char const* member,
+                                 char const* keyV4, char const* keyV6) {
   std::string const type = TypeText(request);
   char const* key;
   if (type == kTypeV4) {
-    key = "gateway";
+    key = keyV4;
   } else if (type == kTypeV6) {
-    key = "gateway_v6";
+    key = keyV6;
   } else {
     VORN_LOG(LOG_ERR, "Unknown type");
     return -1;
   }
-  if (!Given(request, "gateway")) return 0;
+  if (!Given(request, member)) return 0;
   Json::Value const& ifname = request["ifname"];
   if (!ifname.isString()) return -1;
-  return IsDatabaseChanged(ifname.asString(), key, request["gateway"].asString());
+  return IsDatabaseChanged(ifname.asString(), key, request[member].asString());
+}
+
+int RouteModule::IsGatewayConfigChanged(Json::Value const& request) {
+  return IsConfigChanged(request, "gateway", "gateway", "gateway_v6");
 }
 
 int RouteModule::IsDnsConfigChanged(Json::Value const& request) {
-  std::string const type = TypeText(request);
-  char const* key;
-  if (type == kTypeV4) {
-    key = "dns";
-  } else if (type == kTypeV6) {
-    key = "dns_v6";
-  } else {
-    VORN_LOG(LOG_ERR, "Unknown type");
-    return -1;
-  }
-  if (!Given(request, "dns")) return 0;
-  Json::Value const& ifname = request["ifname"];
-  if (!ifname.isString()) return -1;
-  return IsDatabaseChanged(ifname.asString(), key, request["dns"].asString());
+  return IsConfigChanged(request, "dns", "dns", "dns_v6");
 }
 
 int RouteModule::AddGatewayInfo(Json::Value const& request) {

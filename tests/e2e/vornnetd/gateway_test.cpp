@@ -47,15 +47,10 @@ bool Ping() {
   return r.status == 0;
 }
 
-RunResult Ip(std::vector<std::string> args) {
-  args.insert(args.begin(), "/sbin/ip");
-  return vorntest::Run(args);
-}
-
 // The default routes of a family, one per line, with the kernel's trailing blanks and the IPv6
 // "metric 1024 pref medium" tail cut off.
 std::string DefaultRoutes(bool v6 = false) {
-  RunResult r = v6 ? Ip({"-6", "route", "show", "default"}) : Ip({"route", "show", "default"});
+  RunResult r = v6 ? vorntest::Ip({"-6", "route", "show", "default"}) : vorntest::Ip({"route", "show", "default"});
   std::string out = std::regex_replace(r.out, std::regex(" +(metric 1024 )?(pref medium)? *\n"),
                                        "\n");
   return out;
@@ -97,16 +92,16 @@ class Gateways : public testing::Test {
   // cables in and no interfaces but the two uplinks.
   void SetUp() override {
     ASSERT_TRUE(vorntest::InSandbox());
-    Ip({"route", "flush", "exact", "0.0.0.0/0"});
-    Ip({"-6", "route", "flush", "exact", "::/0"});
+    vorntest::Ip({"route", "flush", "exact", "0.0.0.0/0"});
+    vorntest::Ip({"-6", "route", "flush", "exact", "::/0"});
     for (const char* f : {"gateway_v4_priority", "gateway_v6_priority", "gateway_database",
                           "resolv4.conf", "resolv6.conf"}) {
       unlink((kDir + f).c_str());
     }
     unlink("/run/vornplatform/deleted_default_gateway");
-    for (int i = 0; i < 11; ++i) Ip({"link", "del", "up" + std::to_string(i)});
-    Ip({"-6", "addr", "flush", "dev", "eth0", "scope", "global"});
-    Ip({"-6", "addr", "flush", "dev", "eth1", "scope", "global"});
+    for (int i = 0; i < 11; ++i) vorntest::Ip({"link", "del", "up" + std::to_string(i)});
+    vorntest::Ip({"-6", "addr", "flush", "dev", "eth0", "scope", "global"});
+    vorntest::Ip({"-6", "addr", "flush", "dev", "eth1", "scope", "global"});
     std::string why;
     ASSERT_TRUE(vorntest::SetPeerLink("eth0", true, &why)) << why;
     ASSERT_TRUE(vorntest::SetPeerLink("eth1", true, &why)) << why;
@@ -200,7 +195,7 @@ TEST_F(Gateways, CarrierLostThenRefreshMovesTheDefaultRouteToTheSecondUplink) {
 TEST_F(Gateways, AllCandidatesFailingRestoresTheSystemsGateway) {
   AddBoth();
   // The system's own gateway, set outside the module (no "src").
-  ASSERT_EQ(0, Ip({"route", "replace", "default", "via", "10.200.2.1"}).status);
+  ASSERT_EQ(0, vorntest::Ip({"route", "replace", "default", "via", "10.200.2.1"}).status);
   ASSERT_EQ("default via 10.200.2.1 dev eth1\n", DefaultRoutes());
   std::string why;
   ASSERT_TRUE(vorntest::SetPeerLink("eth0", false, &why)) << why;
@@ -212,8 +207,8 @@ TEST_F(Gateways, AllCandidatesFailingRestoresTheSystemsGateway) {
 }
 
 TEST_F(Gateways, Ipv6RoutesFollowTheListAndTheUnspecifiedGatewayRoutesOverTheDevice) {
-  ASSERT_EQ(0, Ip({"-6", "addr", "add", "fd00:1::2/64", "dev", "eth0", "nodad"}).status);
-  ASSERT_EQ(0, Ip({"-6", "addr", "add", "fd00:2::2/64", "dev", "eth1", "nodad"}).status);
+  ASSERT_EQ(0, vorntest::Ip({"-6", "addr", "add", "fd00:1::2/64", "dev", "eth0", "nodad"}).status);
+  ASSERT_EQ(0, vorntest::Ip({"-6", "addr", "add", "fd00:2::2/64", "dev", "eth1", "nodad"}).status);
   ASSERT_EQ(0, Call("AddGatewayData", Add("GTYPE_V6", "eth0", -1, "fd00:1::1", "fd00:1::53",
                                           "wan")).status);
   ASSERT_EQ(0, Call("AddGatewayData", Add("GTYPE_V6", "eth1", -1, "::", "NULL", "wan")).status);
@@ -228,7 +223,7 @@ TEST_F(Gateways, Ipv6RoutesFollowTheListAndTheUnspecifiedGatewayRoutesOverTheDev
   EXPECT_FALSE(vorntest::Exists(kV4Priority));
 
   // A second default route made by hand is swept away at the next refresh.
-  ASSERT_EQ(0, Ip({"-6", "route", "add", "default", "via", "fd00:2::1", "dev", "eth1",
+  ASSERT_EQ(0, vorntest::Ip({"-6", "route", "add", "default", "via", "fd00:2::1", "dev", "eth1",
                    "metric", "50"}).status);
   ASSERT_EQ(0, Call("DelGatewayData", R"({"type": "GTYPE_V6", "ifname": "eth0"})").status);
   EXPECT_EQ("default dev eth1\n", DefaultRoutes(true));
@@ -246,10 +241,10 @@ TEST_F(Gateways, RestartReadsStoredEntriesInSectionNameOrderAndDropsThoseWithout
   // Ten more uplinks with link (veth pairs up at both ends), one without (its pair end down).
   for (int i = 0; i < 11; ++i) {
     std::string a = "up" + std::to_string(i), b = "upp" + std::to_string(i);
-    ASSERT_EQ(0, Ip({"link", "add", a, "type", "veth", "peer", "name", b}).status);
-    ASSERT_EQ(0, Ip({"link", "set", a, "up"}).status);
+    ASSERT_EQ(0, vorntest::Ip({"link", "add", a, "type", "veth", "peer", "name", b}).status);
+    ASSERT_EQ(0, vorntest::Ip({"link", "set", a, "up"}).status);
     if (i != 4) {
-      ASSERT_EQ(0, Ip({"link", "set", b, "up"}).status);
+      ASSERT_EQ(0, vorntest::Ip({"link", "set", b, "up"}).status);
     }
   }
   std::string stored;

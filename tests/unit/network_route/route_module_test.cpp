@@ -44,26 +44,13 @@ const char kSource[] = "network/route/route_module.cpp";
 
 typedef std::vector<std::string> Args;
 
-vorntest::RunResult Ip(Args args) {
-  args.insert(args.begin(), "/sbin/ip");
-  return vorntest::Run(args);
-}
-
-void IpOk(Args const& args) {
-  auto r = Ip(args);
-  ASSERT_EQ(r.status, 0) << r.err;
-}
-
 void PeerIp(std::string const& veth, Args args) {
-  char const* pid = std::getenv(("VORN_PEER_" + veth + "_PID").c_str());
-  ASSERT_NE(pid, nullptr);
-  args.insert(args.begin(), {"/usr/bin/nsenter", "-t", pid, "-n", "/sbin/ip"});
-  auto r = vorntest::Run(args);
+  auto r = vorntest::PeerIp(veth, args);
   ASSERT_EQ(r.status, 0) << r.err;
 }
 
-std::string DefaultV4() { return Ip({"route", "show", "default"}).out; }
-std::string DefaultV6() { return Ip({"-6", "route", "show", "default"}).out; }
+std::string DefaultV4() { return vorntest::Ip({"route", "show", "default"}).out; }
+std::string DefaultV6() { return vorntest::Ip({"-6", "route", "show", "default"}).out; }
 
 Json::Value Request(std::string const& method, std::string const& type) {
   Json::Value r(Json::objectValue);
@@ -120,9 +107,9 @@ class RouteModuleTest : public ::testing::Test {
       std::string why;
       ASSERT_TRUE(vorntest::SetPeerLink(veth, true, &why)) << why;
     }
-    while (Ip({"route", "del", "default"}).status == 0) {
+    while (vorntest::Ip({"route", "del", "default"}).status == 0) {
     }
-    while (Ip({"-6", "route", "del", "default"}).status == 0) {
+    while (vorntest::Ip({"-6", "route", "del", "default"}).status == 0) {
     }
     ASSERT_TRUE(vorntest::InstallFake(kGatewayHook));
     ASSERT_TRUE(vorntest::InstallFake(kDnsHook));
@@ -317,7 +304,7 @@ TEST_F(RouteModuleTest, AllCandidatesFailingRestoresTheSavedSystemGateway) {
   RouteModule m;
   Call(m, AddRequest("GTYPE_V4", "eth0", -1, "10.9.9.9", "NULL", "wan"));
   Call(m, AddRequest("GTYPE_V4", "eth1", -1, "10.8.8.8", "NULL", "wan"));
-  IpOk({"route", "add", "default", "via", "10.200.1.1"});
+  vorntest::IpOk({"route", "add", "default", "via", "10.200.1.1"});
   Call(m, Request("REFRESH_GATEWAY", "GTYPE_V4"));
   EXPECT_EQ(DefaultV4().rfind("default via 10.200.1.1 dev eth0", 0), 0u) << DefaultV4();
   EXPECT_EQ(Names(m, GTYPE_V4), (std::vector<std::string>{"eth0", "eth1"}));
@@ -337,7 +324,7 @@ TEST_F(RouteModuleTest, ASlaveAtIndex0IsPassedOver) {
   EXPECT_EQ(ReadFile(kResolv4), "nameserver 1.1.1.1\nnameserver 8.8.8.8\n");
   // Back to index 0 (the whole old record, slave flag included, is kept). The add refreshes the
   // route: the slave at index 0 is passed over and eth1 moves to the front.
-  IpOk({"route", "del", "default"});
+  vorntest::IpOk({"route", "del", "default"});
   Call(m, AddRequest("GTYPE_V4", "eth0", 0));
   EXPECT_EQ(DefaultV4(), "default via 10.200.2.1 dev eth1 src 10.200.2.2 \n");
   EXPECT_EQ(Names(m, GTYPE_V4), (std::vector<std::string>{"eth1", "eth0"}));
@@ -369,15 +356,15 @@ TEST_F(RouteModuleTest, AWlanEntryOfClassEthernetIsNotAskedForItsLink) {
 }
 
 TEST_F(RouteModuleTest, Ipv6RoutesAreDeletedAndReaddedPerTheList) {
-  IpOk({"-6", "addr", "replace", "2001:db8:1::2/64", "dev", "eth0", "nodad"});
-  IpOk({"-6", "addr", "replace", "2001:db8:2::2/64", "dev", "eth1", "nodad"});
+  vorntest::IpOk({"-6", "addr", "replace", "2001:db8:1::2/64", "dev", "eth0", "nodad"});
+  vorntest::IpOk({"-6", "addr", "replace", "2001:db8:2::2/64", "dev", "eth1", "nodad"});
   PeerIp("eth0", {"-6", "addr", "replace", "2001:db8:1::1/64", "dev", "eth0", "nodad"});
   PeerIp("eth1", {"-6", "addr", "replace", "2001:db8:2::1/64", "dev", "eth1", "nodad"});
 
   RouteModule m;
   // An empty list leaves the present routes.
-  IpOk({"-6", "route", "add", "default", "via", "2001:db8:1::1", "dev", "eth0", "metric", "100"});
-  IpOk({"-6", "route", "add", "default", "via", "2001:db8:2::1", "dev", "eth1", "metric", "256"});
+  vorntest::IpOk({"-6", "route", "add", "default", "via", "2001:db8:1::1", "dev", "eth0", "metric", "100"});
+  vorntest::IpOk({"-6", "route", "add", "default", "via", "2001:db8:2::1", "dev", "eth1", "metric", "256"});
   std::string const present =
       "default via 2001:db8:1::1 dev eth0 metric 100 pref medium\n"
       "default via 2001:db8:2::1 dev eth1 metric 256 pref medium\n";
@@ -405,8 +392,8 @@ TEST_F(RouteModuleTest, Ipv6RoutesAreDeletedAndReaddedPerTheList) {
   // The IPv4 route is not touched by IPv6 requests.
   EXPECT_EQ(DefaultV4(), "");
 
-  IpOk({"-6", "addr", "del", "2001:db8:1::2/64", "dev", "eth0"});
-  IpOk({"-6", "addr", "del", "2001:db8:2::2/64", "dev", "eth1"});
+  vorntest::IpOk({"-6", "addr", "del", "2001:db8:1::2/64", "dev", "eth0"});
+  vorntest::IpOk({"-6", "addr", "del", "2001:db8:2::2/64", "dev", "eth1"});
 }
 
 TEST_F(RouteModuleTest, ElevenStoredEntriesComeBackInStringOrderWithoutTheLinklessOnes) {
@@ -414,15 +401,15 @@ TEST_F(RouteModuleTest, ElevenStoredEntriesComeBackInStringOrderWithoutTheLinkle
   for (int i = 0; i < 6; ++i) {
     std::string a = "ra" + std::to_string(i);
     std::string b = "rb" + std::to_string(i);
-    IpOk({"link", "add", a, "type", "veth", "peer", "name", b});
-    IpOk({"link", "set", a, "up"});
-    IpOk({"link", "set", b, "up"});
+    vorntest::IpOk({"link", "add", a, "type", "veth", "peer", "name", b});
+    vorntest::IpOk({"link", "set", a, "up"});
+    vorntest::IpOk({"link", "set", b, "up"});
     names.push_back(a);
     names.push_back(b);
   }
   // rdown is up but its peer is not: no carrier.
-  IpOk({"link", "add", "rdown", "type", "veth", "peer", "name", "rdpeer"});
-  IpOk({"link", "set", "rdown", "up"});
+  vorntest::IpOk({"link", "add", "rdown", "type", "veth", "peer", "name", "rdpeer"});
+  vorntest::IpOk({"link", "set", "rdown", "up"});
   usleep(300000);
   // Sections "0".."10" name ra0, rb0, ra1, ... in index order; "11" is an interface that is
   // gone, "12" one without link.
@@ -462,8 +449,8 @@ TEST_F(RouteModuleTest, ElevenStoredEntriesComeBackInStringOrderWithoutTheLinkle
   std::string written;
   for (auto const& section : sections) written += section.second;
   EXPECT_EQ(ReadFile(kV4File), written);
-  for (int i = 0; i < 6; ++i) Ip({"link", "del", "ra" + std::to_string(i)});
-  Ip({"link", "del", "rdown"});
+  for (int i = 0; i < 6; ++i) vorntest::Ip({"link", "del", "ra" + std::to_string(i)});
+  vorntest::Ip({"link", "del", "rdown"});
 }
 
 TEST_F(RouteModuleTest, ARestartedModuleReadsTheFilesBack) {
@@ -573,7 +560,7 @@ TEST_F(RouteModuleTest, DeleteRewritesTheListAndRefreshesButKeepsTheDatabase) {
   EXPECT_EQ(DefaultV4(), "default via 10.200.2.1 dev eth1 src 10.200.2.2 \n");
   // An unknown interface still rewrites the list and refreshes.
   ASSERT_TRUE(vorntest::WriteFile(kV4File, "marker\n"));
-  IpOk({"route", "del", "default"});
+  vorntest::IpOk({"route", "del", "default"});
   del["ifname"] = "eth7";
   Call(m, del);
   EXPECT_EQ(ReadFile(kV4File), Entry(0, "eth1", "10.200.2.1", "", "wan"));
@@ -801,17 +788,17 @@ TEST_F(RouteModuleTest, AnUnwritableDirectoryFailsWithTheSpecifiedLines) {
 }
 
 TEST_F(RouteModuleTest, RefreshAllRunsBothFamilies) {
-  IpOk({"-6", "addr", "replace", "2001:db8:1::2/64", "dev", "eth0", "nodad"});
+  vorntest::IpOk({"-6", "addr", "replace", "2001:db8:1::2/64", "dev", "eth0", "nodad"});
   PeerIp("eth0", {"-6", "addr", "replace", "2001:db8:1::1/64", "dev", "eth0", "nodad"});
   RouteModule m;
   Call(m, AddRequest("GTYPE_V4", "eth0", -1, "10.200.1.1"));
   Call(m, AddRequest("GTYPE_V6", "eth0", -1, "2001:db8:1::1"));
-  IpOk({"route", "del", "default"});
-  IpOk({"-6", "route", "del", "default"});
+  vorntest::IpOk({"route", "del", "default"});
+  vorntest::IpOk({"-6", "route", "del", "default"});
   Call(m, Request("REFRESH_GATEWAY", "ALL"));
   EXPECT_EQ(DefaultV4(), "default via 10.200.1.1 dev eth0 src 10.200.1.2 \n");
   EXPECT_EQ(DefaultV6(), "default via 2001:db8:1::1 dev eth0 metric 1024 pref medium\n");
-  IpOk({"-6", "addr", "del", "2001:db8:1::2/64", "dev", "eth0"});
+  vorntest::IpOk({"-6", "addr", "del", "2001:db8:1::2/64", "dev", "eth0"});
 }
 
 TEST_F(RouteModuleTest, AResolverFileThatCannotBeOpenedStopsTheAdd) {

@@ -69,6 +69,8 @@ class RouteModule : public BaseModule {
 
  private:
   int Dispatch(Json::Value const& request, Json::Value& response);
+  int IsConfigChanged(Json::Value const& request, char const* member, char const* keyV4,
+                      char const* keyV6);
   std::vector<GatewayInfo>* PickList(Json::Value const& request);
 
   std::vector<GatewayInfo> _gatewayListV4;
