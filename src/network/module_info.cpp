@@ -1,6 +1,7 @@
 // The daemon's module table, in creation order.
 #include "vornplatform/log.h"
 #include "vornwireless/network/module_manager.h"
+#include "vornwireless/network/netlink/netlink_module.h"
 #include "vornwireless/network/route/route_module.h"
 #include "vornwireless/network/test_module/test_module.h"
 
@@ -22,7 +23,7 @@ BaseModule* CreateUnavailable() {
 
 ModuleManager::MODULE_INFO const ModuleManager::module_info[] = {
     {MODULE_TEST, false, TestModule::Create},
-    {MODULE_NETLINK, true, CreateUnavailable<MODULE_NETLINK>},
+    {MODULE_NETLINK, true, NetlinkModule::Create},
     {MODULE_IPV6, true, CreateUnavailable<MODULE_IPV6>},
     {MODULE_ROUTE, true, RouteModule::Create},
     {MODULE_DEVICELIST, true, CreateUnavailable<MODULE_DEVICELIST>},

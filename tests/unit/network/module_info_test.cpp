@@ -1,9 +1,11 @@
-// The daemon's module table: five rows in creation order, the sample module disabled, and the
-// modules this build does not carry reported as not created.
+// The daemon's module table: five rows in creation order, the sample module disabled, the netlink
+// and route modules carried, and the modules this build does not carry reported as not created.
 #include <gtest/gtest.h>
 
 #include "support/syslog_capture.h"
 #include "vornwireless/network/module_manager.h"
+#include "vornwireless/network/netlink/netlink_module.h"
+#include "vornwireless/network/route/route_module.h"
 #include "vornwireless/network/test_module/test_module.h"
 
 namespace mod = vornnetwork::network::module;
@@ -22,12 +24,16 @@ TEST(ModuleInfo, FiveRowsInCreationOrderWithTheSampleDisabled) {
   EXPECT_EQ(ModuleManager::module_info[0].create, &mod::TestModule::Create);
 }
 
-TEST(ModuleInfo, DaemonInitializeCreatesNoSampleAndRequestsToAbsentModulesFail) {
+TEST(ModuleInfo, TheNetlinkAndRouteModulesAreCarriedTheOthersReportedAbsent) {
+  EXPECT_EQ(ModuleManager::module_info[1].create, &mod::NetlinkModule::Create);
+  EXPECT_EQ(ModuleManager::module_info[3].create, &mod::RouteModule::Create);
+
   ModuleManager& manager = ModuleManager::GetInstance();
   SyslogCapture log;
-  // No module of this build is available: each is reported, none exists, the walk goes on.
+  // The modules this build does not carry are reported and missing; the walk goes on, so the
+  // ones it carries are created, initialised and started.
   EXPECT_FALSE(manager.Initialize());
-  for (int t : {5, 2, 3, 4}) {
+  for (int t : {2, 4}) {
     std::string n = std::to_string(t);
     EXPECT_TRUE(log.HasOnce(LOG_INFO, LogLine("network/module_info.cpp",
                                               "The network module [" + n +
@@ -38,12 +44,17 @@ TEST(ModuleInfo, DaemonInitializeCreatesNoSampleAndRequestsToAbsentModulesFail) 
         << log.Dump();
     EXPECT_FALSE(manager.IsModuleExist(static_cast<mod::MODULE_TYPE>(t)));
   }
+  EXPECT_TRUE(log.Matching("module \\[[35]\\]").empty()) << log.Dump();
+  EXPECT_TRUE(manager.IsModuleExist(mod::MODULE_NETLINK));
+  EXPECT_TRUE(manager.IsModuleExist(mod::MODULE_ROUTE));
   EXPECT_TRUE(log.Matching("Test Module").empty()) << log.Dump();
   EXPECT_EQ(manager.GetModule(mod::MODULE_TEST), nullptr);
   EXPECT_TRUE(manager.Start());
+  EXPECT_EQ(mod::MODULE_STATE_STARTED, manager.GetModule(mod::MODULE_NETLINK)->GetState());
+  EXPECT_EQ(mod::MODULE_STATE_STARTED, manager.GetModule(mod::MODULE_ROUTE)->GetState());
 
   Json::Value request(Json::objectValue), response;
-  for (int t : {1, 3}) {
+  for (int t : {1, 2, 4}) {
     log.Clear();
     EXPECT_EQ(manager.ProcessRequest(static_cast<mod::MODULE_TYPE>(t), request, response), -1);
     EXPECT_TRUE(log.HasOnce(LOG_ERR, LogLine("network/module_manager.cpp",
@@ -51,4 +62,16 @@ TEST(ModuleInfo, DaemonInitializeCreatesNoSampleAndRequestsToAbsentModulesFail) 
         << log.Dump();
   }
   EXPECT_TRUE(response.isNull());
+  // The route module answers its queries.
+  request["method"] = "GET_GATEWAY_DATA_BY_INTERFACE";
+  request["type"] = "GTYPE_V4";
+  request["ifname"] = "eth0";
+  EXPECT_EQ(0, manager.ProcessRequest(mod::MODULE_ROUTE, request, response));
+  EXPECT_EQ(-1, response["priority"].asInt());
+  EXPECT_FALSE(response["exist"].asBool());
+  // Removal answers whether the module still exists.
+  for (int t : {5, 3}) {
+    EXPECT_FALSE(manager.RemoveModule(static_cast<mod::MODULE_TYPE>(t))) << t;
+    EXPECT_FALSE(manager.IsModuleExist(static_cast<mod::MODULE_TYPE>(t))) << t;
+  }
 }

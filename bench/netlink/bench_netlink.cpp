@@ -1,0 +1,292 @@
+// A burst of address events on a veth, consumed by two readers at once: NetlinkModule (its own
+// socket and polling loop) and `ip monitor address`. Prints the time each needs to have consumed
+// every event, counted from the start of the producer (`ip -batch`). Asserts nothing.
+//   bench_netlink [--count N] [--dev IF] [--timeout S]   (inside the sandbox, with --veth eth0)
+#include <linux/rtnetlink.h>
+#include <signal.h>
+#include <spawn.h>
+#include <sys/select.h>
+#include <sys/socket.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <cerrno>
+#include <chrono>
+#include <functional>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "vornwireless/network/netlink/netlink_module.h"
+
+extern char** environ;
+
+namespace {
+
+using Clock = std::chrono::steady_clock;
+
+std::atomic<long> g_moduleEvents{0};
+std::atomic<long> g_moduleErrors{0};
+std::atomic<long long> g_moduleLastNs{0};
+std::atomic<long long> g_moduleCpuNs{0};
+std::atomic<long> g_monitorEvents{0};
+std::atomic<long long> g_monitorLastNs{0};
+Clock::time_point g_origin;
+
+long long Now() {
+  return std::chrono::duration_cast<std::chrono::nanoseconds>(Clock::now() - g_origin).count();
+}
+
+// The module's own loop, with one addition: before the module reads a datagram, the bench peeks
+// at it and counts the address messages in it; the count is published after the module handled
+// them.
+class CountingNetlinkModule : public vornnetwork::network::module::NetlinkModule {
+ public:
+  int StartPolling() override {
+    pthread_setcancelstate(PTHREAD_CANCEL_DISABLE, nullptr);
+    const int fd = GetNetlinkFd();
+    if (fd < 0) return 0;
+    InitInterface();
+    std::vector<char> peek(4096);
+    for (;;) {
+      fd_set set;
+      FD_ZERO(&set);
+      FD_SET(fd, &set);
+      timeval tv{6, 0};
+      pthread_setcancelstate(PTHREAD_CANCEL_ENABLE, nullptr);
+      const int ready = select(fd + 1, &set, nullptr, nullptr, &tv);
+      pthread_setcancelstate(PTHREAD_CANCEL_DISABLE, nullptr);
+      if (ready < 1) continue;
+      const ssize_t n = recv(fd, peek.data(), peek.size(), MSG_PEEK | MSG_DONTWAIT);
+      if (n < 0) {
+        if (errno != EAGAIN && errno != EINTR) ++g_moduleErrors;  // ENOBUFS: events were lost
+        continue;
+      }
+      long count = 0;
+      ssize_t left = n;
+      for (nlmsghdr* h = reinterpret_cast<nlmsghdr*>(peek.data()); NLMSG_OK(h, left);
+           h = NLMSG_NEXT(h, left)) {
+        if (h->nlmsg_type == RTM_NEWADDR || h->nlmsg_type == RTM_DELADDR) ++count;
+      }
+      AnalysisNetlinkMessage();
+      timespec cpu;
+      if (clock_gettime(CLOCK_THREAD_CPUTIME_ID, &cpu) == 0) {
+        g_moduleCpuNs = cpu.tv_sec * 1000000000LL + cpu.tv_nsec;
+      }
+      if (count > 0) {
+        g_moduleEvents += count;
+        g_moduleLastNs = Now();
+      }
+    }
+  }
+};
+
+pid_t Spawn(const std::vector<std::string>& args, int* outFd, int inFd = -1) {
+  int pipeFd[2] = {-1, -1};
+  if (outFd != nullptr && pipe(pipeFd) != 0) return -1;
+  posix_spawn_file_actions_t actions;
+  posix_spawn_file_actions_init(&actions);
+  if (outFd != nullptr) {
+    posix_spawn_file_actions_adddup2(&actions, pipeFd[1], 1);
+    posix_spawn_file_actions_addclose(&actions, pipeFd[0]);
+  }
+  if (inFd >= 0) posix_spawn_file_actions_adddup2(&actions, inFd, 0);
+  std::vector<char*> argv;
+  for (const auto& a : args) argv.push_back(const_cast<char*>(a.c_str()));
+  argv.push_back(nullptr);
+  pid_t pid = -1;
+  if (posix_spawn(&pid, argv[0], &actions, nullptr, argv.data(), environ) != 0) pid = -1;
+  posix_spawn_file_actions_destroy(&actions);
+  if (outFd != nullptr) {
+    close(pipeFd[1]);
+    *outFd = pipeFd[0];
+  }
+  return pid;
+}
+
+// Runs `ip -batch FILE`; its exit status.
+int IpBatch(const std::string& commands) {
+  char path[] = "/tmp/bench-netlink-XXXXXX";
+  const int fd = mkstemp(path);
+  if (fd < 0) return -1;
+  if (write(fd, commands.data(), commands.size()) != static_cast<ssize_t>(commands.size())) {
+    close(fd);
+    return -1;
+  }
+  close(fd);
+  const pid_t pid = Spawn({"/sbin/ip", "-batch", path}, nullptr);
+  int status = -1;
+  if (pid > 0) waitpid(pid, &status, 0);
+  unlink(path);
+  return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
+
+void ReadMonitor(int fd) {
+  FILE* in = fdopen(fd, "r");
+  if (in == nullptr) return;
+  char line[4096];
+  while (std::fgets(line, sizeof line, in) != nullptr) {
+    if (line[0] == ' ' || line[0] == '\t' || line[0] == '\n') continue;  // continuation line
+    if (std::strstr(line, " 10.100.") == nullptr && std::strstr(line, " 10.99.") == nullptr) {
+      continue;  // not one of ours
+    }
+    ++g_monitorEvents;
+    g_monitorLastNs = Now();
+  }
+  std::fclose(in);
+}
+
+// User + system CPU time of a process, in seconds (-1 when unreadable).
+double ProcessCpuSeconds(pid_t pid) {
+  FILE* f = std::fopen(("/proc/" + std::to_string(pid) + "/stat").c_str(), "r");
+  if (f == nullptr) return -1;
+  char buf[2048] = "";
+  const size_t n = std::fread(buf, 1, sizeof buf - 1, f);
+  std::fclose(f);
+  buf[n] = '\0';
+  const char* p = std::strrchr(buf, ')');
+  if (p == nullptr) return -1;
+  unsigned long utime = 0, stime = 0;
+  // Fields after the name: state(3) ... utime(14) stime(15).
+  if (std::sscanf(p + 2, "%*c %*d %*d %*d %*d %*d %*u %*u %*u %*u %*u %lu %lu", &utime, &stime) != 2) {
+    return -1;
+  }
+  return static_cast<double>(utime + stime) / sysconf(_SC_CLK_TCK);
+}
+
+bool WaitUntil(const std::function<bool()>& done, double seconds) {
+  const auto end = Clock::now() + std::chrono::duration<double>(seconds);
+  while (Clock::now() < end) {
+    if (done()) return true;
+    std::this_thread::sleep_for(std::chrono::milliseconds(2));
+  }
+  return done();
+}
+
+std::string Commands(const char* verb, int count, const std::string& dev) {
+  std::string text;
+  for (int i = 0; i < count; ++i) {
+    text += std::string("address ") + verb + " 10.100." + std::to_string(i / 250) + "." +
+            std::to_string(i % 250 + 1) + "/32 dev " + dev + "\n";
+  }
+  return text;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  int count = 10000;
+  double timeout = 120;
+  std::string dev = "eth0";
+  for (int i = 1; i + 1 < argc; i += 2) {
+    if (std::strcmp(argv[i], "--count") == 0) count = std::atoi(argv[i + 1]);
+    if (std::strcmp(argv[i], "--dev") == 0) dev = argv[i + 1];
+    if (std::strcmp(argv[i], "--timeout") == 0) timeout = std::atof(argv[i + 1]);
+  }
+  if (count < 1 || count > 60000) {
+    std::fprintf(stderr, "--count must be 1..60000\n");
+    return 2;
+  }
+  g_origin = Clock::now();
+
+  int monitorFd = -1;
+  const pid_t monitor = Spawn({"/sbin/ip", "monitor", "address"}, &monitorFd);
+  if (monitor <= 0) {
+    std::perror("ip monitor");
+    return 1;
+  }
+  std::thread reader(ReadMonitor, monitorFd);
+
+  CountingNetlinkModule module;
+  if (module.Initialize() != 0 || module.Start() != 0) {
+    std::fprintf(stderr, "the module did not start\n");
+    return 1;
+  }  {
+    int rcvbuf = 0;
+    socklen_t len = sizeof rcvbuf;
+    getsockopt(module.GetNetlinkFd(), SOL_SOCKET, SO_RCVBUF, &rcvbuf, &len);
+    std::printf("module socket receive buffer: %d bytes\n", rcvbuf);
+  }
+
+  // Warm-up: both readers must see one add and one delete before the burst.
+  const std::string warm = "address add 10.99.99.99/32 dev " + dev +
+                           "\naddress del 10.99.99.99/32 dev " + dev + "\n";
+  // (ip monitor subscribes some time after it was started: repeat until it has seen a pair.)
+  bool warmedUp = false;
+  for (int i = 0; i < 50 && !warmedUp; ++i) {
+    if (IpBatch(warm) != 0) break;
+    warmedUp = WaitUntil([] { return g_moduleEvents >= 2 && g_monitorEvents >= 2; }, 0.2);
+  }
+  if (!warmedUp) {
+    std::fprintf(stderr, "warm-up events did not arrive (module %ld, monitor %ld)\n",
+                 g_moduleEvents.load(), g_monitorEvents.load());
+    module.Terminate();
+    kill(monitor, SIGTERM);
+    waitpid(monitor, nullptr, 0);
+    reader.join();
+    return 1;
+  }
+  // Let the last warm-up pair arrive at both before the counts are taken.
+  std::this_thread::sleep_for(std::chrono::milliseconds(200));
+  const long long cpuBase = g_moduleCpuNs;
+  const double monitorCpuBase = ProcessCpuSeconds(monitor);
+  const long moduleBase = g_moduleEvents;
+  const long monitorBase = g_monitorEvents;
+  const long errorBase = g_moduleErrors;
+  const long expected = 2L * count;
+
+  const std::string adds = Commands("add", count, dev);
+  const std::string dels = Commands("del", count, dev);
+  const long long start = Now();
+  const int rcAdd = IpBatch(adds);
+  const int rcDel = IpBatch(dels);
+  const long long produced = Now();
+  // Until both have everything, or (a reader lost events) nothing arrived for 2 s.
+  long lastSeen = -1;
+  auto quietSince = Clock::now();
+  WaitUntil(
+      [&] {
+        const long seen = g_moduleEvents + g_monitorEvents;
+        if (seen != lastSeen) {
+          lastSeen = seen;
+          quietSince = Clock::now();
+        }
+        return (g_moduleEvents - moduleBase >= expected &&
+                g_monitorEvents - monitorBase >= expected) ||
+               Clock::now() - quietSince > std::chrono::seconds(2);
+      },
+      timeout);
+
+  const double monitorCpu = ProcessCpuSeconds(monitor) - monitorCpuBase;
+  module.Terminate();
+  kill(monitor, SIGTERM);
+  waitpid(monitor, nullptr, 0);
+  reader.join();
+  const double moduleCpu = (g_moduleCpuNs - cpuBase) / 1e9;
+
+  const long moduleGot = g_moduleEvents - moduleBase;
+  const long monitorGot = g_monitorEvents - monitorBase;
+  auto seconds = [&](long long ns) { return (ns - start) / 1e9; };
+  std::printf("address events: %d additions + %d removals on %s (ip -batch exit %d/%d), no hook\n",
+              count, count, dev.c_str(), rcAdd, rcDel);
+  std::printf("%-28s %10s %12s %14s\n", "consumer", "events", "of expected", "all consumed");
+  std::printf("%-28s %10.3f s\n", "producer (ip -batch)", seconds(produced));
+  std::printf("%-28s %10ld %12ld %12.3f s%s\n", "NetlinkModule", moduleGot, expected,
+              seconds(g_moduleLastNs), moduleGot >= expected ? "" : "  (incomplete: last event)");
+  std::printf("%-28s %10ld %12ld %12.3f s%s\n", "ip monitor address", monitorGot, expected,
+              seconds(g_monitorLastNs), monitorGot >= expected ? "" : "  (incomplete: last event)");
+  std::printf("NetlinkModule recv errors (ENOBUFS, events lost): %ld\n",
+              g_moduleErrors.load() - errorBase);
+  std::printf("CPU time: NetlinkModule thread %.3f s (%.1f us/event), ip monitor %.3f s (%.1f us/event)\n",
+              moduleCpu, moduleGot > 0 ? moduleCpu * 1e6 / moduleGot : 0.0, monitorCpu,
+              monitorGot > 0 ? monitorCpu * 1e6 / monitorGot : 0.0);
+  if (moduleGot > 0 && monitorGot > 0) {
+    std::printf("module / ip monitor time ratio: %.2f\n",
+                seconds(g_moduleLastNs) / seconds(g_monitorLastNs));
+  }
+  return 0;
+}
