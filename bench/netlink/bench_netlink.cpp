@@ -1,7 +1,9 @@
 // A burst of address events on a veth, consumed by two readers at once: NetlinkModule (its own
 // socket and polling loop) and `ip monitor address`. Prints the time each needs to have consumed
 // every event, counted from the start of the producer (`ip -batch`). Asserts nothing.
-//   bench_netlink [--count N] [--dev IF] [--timeout S]   (inside the sandbox, with --veth eth0)
+// With --daemon, the consumer is the real vornnetd instead, timed by a marker event after the burst.
+//   bench_netlink [--count N] [--dev IF] [--timeout S] [--daemon PATH]
+//   (inside the sandbox, with --veth eth0; --daemon needs its bus)
 #include <linux/rtnetlink.h>
 #include <signal.h>
 #include <spawn.h>
@@ -176,13 +178,115 @@ std::string Commands(const char* verb, int count, const std::string& dev) {
   return text;
 }
 
+// The real vornnetd consuming the same burst. Its watcher reads one socket in order, so when the
+// platform's link-down action runs for a marker interface whose cable is pulled after the burst,
+// every address event before it has been handled. Only that action is installed: no hook.
+const char kMarkFile[] = "/tmp/bench-netlink-mark";
+const char kLinkDownAction[] = "/usr/vorn/libexec/platform/VLIBNetIfLinkDownEvent";
+
+bool Sh(const std::string& command) {
+  const pid_t pid = Spawn({"/bin/sh", "-c", command}, nullptr);
+  int status = -1;
+  if (pid > 0) waitpid(pid, &status, 0);
+  return WIFEXITED(status) && WEXITSTATUS(status) == 0;
+}
+
+// Pulls the marker's cable and waits for the action; seconds from the pull, -1 on time-out.
+double Mark(double timeout) {
+  unlink(kMarkFile);
+  const auto t0 = Clock::now();
+  if (!Sh("ip link set mark1 down")) return -1;
+  const bool seen = WaitUntil([] { return access(kMarkFile, F_OK) == 0; }, timeout);
+  const double s = std::chrono::duration<double>(Clock::now() - t0).count();
+  Sh("ip link set mark1 up");
+  // Wait for the carrier to come back, so the next pull is a change.
+  WaitUntil([] { return Sh("grep -qx 1 /sys/class/net/mark0/carrier"); }, 5);
+  return seen ? s : -1;
+}
+
+int SyslogCount(const char* text) {
+  const char* path = std::getenv("VORN_SYSLOG_FILE");
+  if (path == nullptr) return -1;
+  FILE* f = std::fopen(path, "r");
+  if (f == nullptr) return -1;
+  char line[4096];
+  int n = 0;
+  while (std::fgets(line, sizeof line, f) != nullptr) n += std::strstr(line, text) != nullptr;
+  std::fclose(f);
+  return n;
+}
+
+int RunDaemon(const std::string& daemon, int count, const std::string& dev, double timeout) {
+  if (!Sh("mkdir -p /usr/vorn/libexec/platform && printf '#!/bin/sh\\n[ \"$1\" = mark0 ] && : > " +
+          std::string(kMarkFile) + "\\nexit 0\\n' > " + kLinkDownAction + " && chmod 755 " +
+          kLinkDownAction) ||
+      !Sh("ip link add mark0 type veth peer name mark1 && ip link set mark0 up && "
+          "ip link set mark1 up")) {
+    std::fprintf(stderr, "cannot set up the marker\n");
+    return 1;
+  }
+  WaitUntil([] { return Sh("grep -qx 1 /sys/class/net/mark0/carrier"); }, 5);
+  const pid_t pid = Spawn({daemon}, nullptr);
+  if (pid <= 0) return 1;
+  // Until the watcher runs: the first pull that is reported.
+  double idle = -1;
+  for (int i = 0; i < 20 && idle < 0; ++i) idle = Mark(0.5);
+  if (idle < 0) {
+    std::fprintf(stderr, "vornnetd did not report the marker\n");
+    kill(pid, SIGTERM);
+    waitpid(pid, nullptr, 0);
+    return 1;
+  }
+  idle = Mark(5);  // the latency of the marker alone, on an idle daemon
+  const int lostBase = SyslogCount("recvmsg ret");
+  const double cpuBase = ProcessCpuSeconds(pid);
+
+  int monitorFd = -1;
+  const pid_t monitor = Spawn({"/sbin/ip", "monitor", "address"}, &monitorFd);
+  std::thread reader(ReadMonitor, monitorFd);
+  WaitUntil([] { return false; }, 0.3);  // let ip monitor subscribe
+  const long monitorBase = g_monitorEvents;
+  const long expected = 2L * count;
+  const long long start = Now();
+  const int rcAdd = IpBatch(Commands("add", count, dev));
+  const int rcDel = IpBatch(Commands("del", count, dev));
+  const long long produced = Now();
+  WaitUntil([&] { return g_monitorEvents - monitorBase >= expected; }, timeout);
+  const double marked = Mark(timeout);
+  const long long consumed = Now();
+  const double cpu = ProcessCpuSeconds(pid) - cpuBase;
+  kill(monitor, SIGTERM);
+  waitpid(monitor, nullptr, 0);
+  reader.join();
+  kill(pid, SIGTERM);
+  waitpid(pid, nullptr, 0);
+
+  auto seconds = [&](long long ns) { return (ns - start) / 1e9; };
+  std::printf("vornnetd (%s): %d additions + %d removals on %s (ip -batch exit %d/%d), no hook\n",
+              daemon.c_str(), count, count, dev.c_str(), rcAdd, rcDel);
+  std::printf("%-28s %10.3f s\n", "producer (ip -batch)", seconds(produced));
+  std::printf("%-28s %10.3f s  (%ld of %ld events)\n", "ip monitor address",
+              seconds(g_monitorLastNs), g_monitorEvents - monitorBase, expected);
+  if (marked < 0) {
+    std::printf("vornnetd: the marker after the burst was not reported within %.0f s\n", timeout);
+  } else {
+    std::printf("%-28s %10.3f s  (the marker's own latency on an idle daemon: %.1f ms)\n",
+                "vornnetd, all consumed", seconds(consumed) - idle, idle * 1000);
+  }
+  std::printf("vornnetd recv errors (events lost to overflow): %d\n",
+              SyslogCount("recvmsg ret") - lostBase);
+  std::printf("vornnetd CPU for the burst: %.3f s (%.1f us/event)\n", cpu, cpu * 1e6 / expected);
+  return 0;
+}
+
 }  // namespace
 
 int main(int argc, char** argv) {
   int count = 10000;
   double timeout = 120;
-  std::string dev = "eth0";
+  std::string dev = "eth0", daemon;
   for (int i = 1; i + 1 < argc; i += 2) {
+    if (std::strcmp(argv[i], "--daemon") == 0) daemon = argv[i + 1];
     if (std::strcmp(argv[i], "--count") == 0) count = std::atoi(argv[i + 1]);
     if (std::strcmp(argv[i], "--dev") == 0) dev = argv[i + 1];
     if (std::strcmp(argv[i], "--timeout") == 0) timeout = std::atof(argv[i + 1]);
@@ -192,6 +296,7 @@ int main(int argc, char** argv) {
     return 2;
   }
   g_origin = Clock::now();
+  if (!daemon.empty()) return RunDaemon(daemon, count, dev, timeout);
 
   int monitorFd = -1;
   const pid_t monitor = Spawn({"/sbin/ip", "monitor", "address"}, &monitorFd);
@@ -205,7 +310,8 @@ int main(int argc, char** argv) {
   if (module.Initialize() != 0 || module.Start() != 0) {
     std::fprintf(stderr, "the module did not start\n");
     return 1;
-  }  {
+  }
+  {
     int rcvbuf = 0;
     socklen_t len = sizeof rcvbuf;
     getsockopt(module.GetNetlinkFd(), SOL_SOCKET, SO_RCVBUF, &rcvbuf, &len);
