@@ -231,11 +231,20 @@ int RouteModule::TerminateModule() { return 0; }
 
 int RouteModule::StartModule() { return 0; }
 
-std::vector<GatewayInfo>* RouteModule::PickList(Json::Value const& request) {
-  std::string const type = TypeText(request);
-  if (type == kTypeV4) return &_gatewayListV4;
-  if (type == kTypeV6) return &_gatewayListV6;
-  return nullptr;
+std::vector<GatewayInfo>* RouteModule::PickList(Json::Value const& request,
+                                                char const* unknownText, GATEWAY_TYPE* type) {
+  std::string const text = TypeText(request);
+  GATEWAY_TYPE picked;
+  if (text == kTypeV4) {
+    picked = GTYPE_V4;
+  } else if (text == kTypeV6) {
+    picked = GTYPE_V6;
+  } else {
+    VORN_LOG(LOG_ERR, "%s", unknownText);
+    return nullptr;
+  }
+  if (type != nullptr) *type = picked;
+  return picked == GTYPE_V4 ? &_gatewayListV4 : &_gatewayListV6;
 }
 
 std::vector<GatewayInfo> RouteModule::GetGatewayList(GATEWAY_TYPE type) {
@@ -427,12 +436,9 @@ int RouteModule::IsDnsConfigChanged(Json::Value const& request) {
 int RouteModule::AddGatewayInfo(Json::Value const& request) {
   int priority = 0;
   if (!ReadPriority(request, priority)) return -1;
-  std::vector<GatewayInfo>* list = PickList(request);
-  if (list == nullptr) {
-    VORN_LOG(LOG_ERR, "Unknown type to add info");
-    return -1;
-  }
-  GATEWAY_TYPE const type = list == &_gatewayListV4 ? GTYPE_V4 : GTYPE_V6;
+  GATEWAY_TYPE type;
+  std::vector<GatewayInfo>* list = PickList(request, "Unknown type to add info", &type);
+  if (list == nullptr) return -1;
   char const* family = type == GTYPE_V4 ? "ipv4" : "ipv6";
   std::string ifname;
   if (!ReadIfname(request, "ifname", ifname)) return -1;
@@ -510,12 +516,9 @@ int RouteModule::AddGatewayInfo(Json::Value const& request) {
 }
 
 int RouteModule::DelGatewayInfo(Json::Value const& request) {
-  std::vector<GatewayInfo>* list = PickList(request);
-  if (list == nullptr) {
-    VORN_LOG(LOG_ERR, "Unknown type to delete info");
-    return -1;
-  }
-  GATEWAY_TYPE const type = list == &_gatewayListV4 ? GTYPE_V4 : GTYPE_V6;
+  GATEWAY_TYPE type;
+  std::vector<GatewayInfo>* list = PickList(request, "Unknown type to delete info", &type);
+  if (list == nullptr) return -1;
   std::string ifname;
   if (!ReadIfname(request, "ifname", ifname)) return -1;
 
@@ -534,12 +537,9 @@ int RouteModule::DelGatewayInfo(Json::Value const& request) {
 }
 
 int RouteModule::SetSlaveForGatewayInfo(Json::Value const& request) {
-  std::vector<GatewayInfo>* list = PickList(request);
-  if (list == nullptr) {
-    VORN_LOG(LOG_ERR, "Unknown type to delete info");
-    return -1;
-  }
-  GATEWAY_TYPE const type = list == &_gatewayListV4 ? GTYPE_V4 : GTYPE_V6;
+  GATEWAY_TYPE type;
+  std::vector<GatewayInfo>* list = PickList(request, "Unknown type to delete info", &type);
+  if (list == nullptr) return -1;
   std::string ifname;
   if (!ReadIfname(request, "ifname", ifname)) return -1;
   bool slave = false;
@@ -561,12 +561,9 @@ int RouteModule::SetSlaveForGatewayInfo(Json::Value const& request) {
 }
 
 int RouteModule::CopyGatewayData(Json::Value const& request) {
-  std::vector<GatewayInfo>* list = PickList(request);
-  if (list == nullptr) {
-    VORN_LOG(LOG_ERR, "Unknown type to get data");
-    return -1;
-  }
-  GATEWAY_TYPE const type = list == &_gatewayListV4 ? GTYPE_V4 : GTYPE_V6;
+  GATEWAY_TYPE type;
+  std::vector<GatewayInfo>* list = PickList(request, "Unknown type to get data", &type);
+  if (list == nullptr) return -1;
   std::string source;
   std::string destination;
   bool sourceDelete = false;
@@ -604,11 +601,8 @@ int RouteModule::CopyGatewayData(Json::Value const& request) {
 }
 
 int RouteModule::GetGatewayListData(Json::Value const& request, Json::Value& response) {
-  std::vector<GatewayInfo>* list = PickList(request);
-  if (list == nullptr) {
-    VORN_LOG(LOG_ERR, "Unknown type to get data");
-    return -1;
-  }
+  std::vector<GatewayInfo>* list = PickList(request, "Unknown type to get data", nullptr);
+  if (list == nullptr) return -1;
   std::string heartbeat;
   if (VORNHAIsRunning() != 0) {
     char name[16] = "";
@@ -636,11 +630,8 @@ int RouteModule::GetGatewayListData(Json::Value const& request, Json::Value& res
 }
 
 int RouteModule::GetGatewayDataByInterface(Json::Value const& request, Json::Value& response) {
-  std::vector<GatewayInfo>* list = PickList(request);
-  if (list == nullptr) {
-    VORN_LOG(LOG_ERR, "Unknown type to get data");
-    return -1;
-  }
+  std::vector<GatewayInfo>* list = PickList(request, "Unknown type to get data", nullptr);
+  if (list == nullptr) return -1;
   Json::Value const& ifnameValue = request["ifname"];
   if (!ifnameValue.isString()) {
     VORN_LOG(LOG_ERR, "Invalid member [%s] in request", "ifname");

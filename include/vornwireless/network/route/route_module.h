@@ -71,7 +71,9 @@ class RouteModule : public BaseModule {
   int Dispatch(Json::Value const& request, Json::Value& response);
   int IsConfigChanged(Json::Value const& request, char const* member, char const* keyV4,
                       char const* keyV6);
-  std::vector<GatewayInfo>* PickList(Json::Value const& request);
+  // The list of the request's "type" (and the family in *type); NULL after logging unknownText.
+  std::vector<GatewayInfo>* PickList(Json::Value const& request, char const* unknownText,
+                                     GATEWAY_TYPE* type);
 
   std::vector<GatewayInfo> _gatewayListV4;
   std::vector<GatewayInfo> _gatewayListV6;
