@@ -23,10 +23,8 @@ using vorntest::LogLine;
 
 namespace {
 
-const char kFile[] = "network/netlink/netlink_module.cpp";
-const char kScripts[] = "/etc/sysconfig/network-scripts";
-const unsigned int kLowerUp = 0x10000;
-const unsigned int kUp = IFF_UP | IFF_RUNNING | kLowerUp;
+using namespace vorntest::netlink_constants;
+
 
 void IpBatch(const std::string& commands) {
   auto r = vorntest::Run({"/usr/sbin/ip", "-batch", "-"}, commands);

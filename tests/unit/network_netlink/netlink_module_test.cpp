@@ -28,11 +28,9 @@ using vorntest::RouteMessage;
 
 namespace {
 
-const char kFile[] = "network/netlink/netlink_module.cpp";
-const char kScripts[] = "/etc/sysconfig/network-scripts";
-const unsigned int kLowerUp = 0x10000;                         // IFF_LOWER_UP
-const unsigned int kUp = IFF_UP | IFF_RUNNING | kLowerUp;  // link up as the kernel says it
-const unsigned int kDown = IFF_UP;                             // administratively up, no carrier
+using namespace vorntest::netlink_constants;
+
+const unsigned int kDown = IFF_UP;  // administratively up, no carrier
 
 void Ifcfg(const std::string& ifname, const std::string& content) {
   ASSERT_EQ(vorntest::Run({"/bin/mkdir", "-p", kScripts}).status, 0);

@@ -26,6 +26,13 @@
 
 namespace vorntest {
 
+namespace netlink_constants {
+const char kFile[] = "network/netlink/netlink_module.cpp";  // the watcher's log lines
+const char kScripts[] = "/etc/sysconfig/network-scripts";
+const unsigned int kLowerUp = 0x10000;                     // IFF_LOWER_UP
+const unsigned int kUp = IFF_UP | IFF_RUNNING | kLowerUp;  // link up as the kernel says it
+}  // namespace netlink_constants
+
 // One netlink message: header, fixed body, attributes; lengths filled in as it grows.
 class NlMessage {
  public:
