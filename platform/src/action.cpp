@@ -22,9 +22,12 @@ bool ValidActionName(const char* name) {
          std::strcmp(name, "..") != 0;
 }
 
-// Runs an action whose exit status must be 0. 0, or -1 with the error recorded.
-int RunStrictAction(const char* name) {
-  const int rc = vornplatform::RunAction(name, {});
+}  // namespace
+
+namespace vornplatform {
+
+int RunStrictAction(const char* name, const std::vector<std::string>& args) {
+  const int rc = RunAction(name, args);
   if (rc == 0) return 0;
   if (rc > 0) {
     VORN_LOG(LOG_ERR, "platform action %s exited with %d", name, rc);
@@ -32,10 +35,6 @@ int RunStrictAction(const char* name) {
   }
   return -1;
 }
-
-}  // namespace
-
-namespace vornplatform {
 
 int RunAction(const char* name, const std::vector<std::string>& args, std::string* out) {
   if (out != nullptr) out->clear();
@@ -70,6 +69,6 @@ int RunAction(const char* name, const std::vector<std::string>& args, std::strin
 
 }  // namespace vornplatform
 
-int VORNFwRuleHup() { return RunStrictAction("VORNFwRuleHup"); }
+int VORNFwRuleHup() { return vornplatform::RunStrictAction("VORNFwRuleHup"); }
 
-int VORNFwTcRuleHup() { return RunStrictAction("VORNFwTcRuleHup"); }
+int VORNFwTcRuleHup() { return vornplatform::RunStrictAction("VORNFwTcRuleHup"); }

@@ -61,15 +61,7 @@ int RunLinkAction(const char* action, const char* ifname) {
     VLIBC_ERR_SET(VLIBC_ERR_BAD_PARAMETER);
     return -1;
   }
-  return NoThrow(-1, [&]() -> int {
-    const int rc = vornplatform::RunAction(action, {ifname});
-    if (rc == 0) return 0;
-    if (rc > 0) {
-      VORN_LOG(LOG_ERR, "platform action %s exited with %d", action, rc);
-      VLIBC_ERR_SET(VLIBC_ERR_EXEC);
-    }
-    return -1;
-  });
+  return NoThrow(-1, [&]() -> int { return vornplatform::RunStrictAction(action, {ifname}); });
 }
 
 }  // namespace
@@ -200,13 +192,7 @@ int VORNNetSetCard1_S(PVORN_NETIF_INFO info) {
     return -1;
   }
   return NoThrow(-1, [&]() -> int {
-    const int rc = vornplatform::RunAction(
+    return vornplatform::RunStrictAction(
         "VORNNetSetCard1", {info->szIfName, std::to_string(info->iFlag), info->szIP, info->szMask});
-    if (rc == 0) return 0;
-    if (rc > 0) {
-      VORN_LOG(LOG_ERR, "platform action %s exited with %d", "VORNNetSetCard1", rc);
-      VLIBC_ERR_SET(VLIBC_ERR_EXEC);
-    }
-    return -1;
   });
 }

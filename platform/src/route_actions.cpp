@@ -31,17 +31,6 @@ bool ValidIfName(const char* ifname) {
 
 const char* Text(const char* s) { return s != nullptr ? s : ""; }
 
-// Runs an action whose exit status must be 0. 0, or -1 with the error recorded.
-int RunHookAction(const char* name, const std::vector<std::string>& args) {
-  const int rc = vornplatform::RunAction(name, args);
-  if (rc == 0) return 0;
-  if (rc > 0) {
-    VORN_LOG(LOG_ERR, "platform action %s exited with %d", name, rc);
-    VLIBC_ERR_SET(VLIBC_ERR_EXEC);
-  }
-  return -1;
-}
-
 // The first line of an action's stdout, without the line break and trailing blanks.
 std::string FirstLine(const std::string& out) {
   std::string line = out.substr(0, out.find('\n'));
@@ -132,7 +121,7 @@ int VORNHAGetHeartbeatIF(char* buf, int size) {
 int VORNNetGatewayConfigChangeHook(int stage, const char* family, const char* ifname,
                                    const char* oldGateway, const char* newGateway) {
   return NoThrow(-1, [&]() -> int {
-    return RunHookAction(
+    return vornplatform::RunStrictAction(
         "VORNNetGatewayConfigChangeHook",
         {std::to_string(stage), Text(family), Text(ifname), Text(oldGateway), Text(newGateway)});
   });
@@ -143,7 +132,7 @@ int VORNNetDnsConfigChangeHook(int stage, const char* ifname, PVLIBSZLIST dnsLis
     std::vector<std::string> args{std::to_string(stage), Text(ifname)};
     const int count = dnsList != nullptr ? VLIBCSzListCount(dnsList) : 0;
     for (int i = 0; i < count; ++i) args.push_back(Text(VLIBCSzListGet(dnsList, i)));
-    return RunHookAction("VORNNetDnsConfigChangeHook", args);
+    return vornplatform::RunStrictAction("VORNNetDnsConfigChangeHook", args);
   });
 }
 
@@ -151,7 +140,7 @@ namespace vornnetsdk {
 namespace sdk_s {
 
 int VORNNetDNSUpdate_S() {
-  return NoThrow(-1, []() -> int { return RunHookAction("VORNNetDNSUpdate", {}); });
+  return NoThrow(-1, []() -> int { return vornplatform::RunStrictAction("VORNNetDNSUpdate", {}); });
 }
 
 }  // namespace sdk_s

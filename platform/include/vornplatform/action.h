@@ -14,6 +14,9 @@ namespace vornplatform {
 // run, a signal ended it, or name is not a plain file name (error register set). When out is not
 // NULL it receives the action's stdout (empty for a missing action); otherwise stdout is ours.
 int RunAction(const char* name, const std::vector<std::string>& args, std::string* out = nullptr);
+// RunAction for an action that must succeed: 0 (a missing action included), -1 when it could not
+// run or exited with another status (logged, error register set).
+int RunStrictAction(const char* name, const std::vector<std::string>& args = {});
 }  // namespace vornplatform
 
 // The actions "VORNFwRuleHup" and "VORNFwTcRuleHup". 0 success (a missing action included),
