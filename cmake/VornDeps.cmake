@@ -3,6 +3,7 @@ find_package(PkgConfig REQUIRED)
 find_package(Threads REQUIRED)
 pkg_check_modules(GLIB REQUIRED IMPORTED_TARGET glib-2.0 gobject-2.0 gio-2.0 gio-unix-2.0)
 pkg_check_modules(JSONCPP REQUIRED IMPORTED_TARGET jsoncpp)
+pkg_check_modules(UPNP REQUIRED IMPORTED_TARGET libupnp)
 find_package(OpenSSL REQUIRED COMPONENTS Crypto)
 find_package(Boost REQUIRED)
 

@@ -1,5 +1,6 @@
 // The daemon's module table, in creation order.
 #include "vornplatform/log.h"
+#include "vornwireless/network/devicelist/device_list_module.h"
 #include "vornwireless/network/module_manager.h"
 #include "vornwireless/network/netlink/netlink_module.h"
 #include "vornwireless/network/route/route_module.h"
@@ -26,7 +27,7 @@ ModuleManager::MODULE_INFO const ModuleManager::module_info[] = {
     {MODULE_NETLINK, true, NetlinkModule::Create},
     {MODULE_IPV6, true, CreateUnavailable<MODULE_IPV6>},
     {MODULE_ROUTE, true, RouteModule::Create},
-    {MODULE_DEVICELIST, true, CreateUnavailable<MODULE_DEVICELIST>},
+    {MODULE_DEVICELIST, true, DeviceListModule::Create},
 };
 
 std::size_t const ModuleManager::module_info_count =
