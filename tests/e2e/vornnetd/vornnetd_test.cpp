@@ -109,7 +109,7 @@ TEST_F(Vornnetd, EveryMethodAnswersAndAnAbsentModuleGivesTheMethodsFailureText) 
           << log.Dump();
     } else {
       // A present module answers: a reply, or an error of its own (never a lost call).
-      EXPECT_TRUE(r.status == 0 || r.err.find("GDBus.Error:org.freedesktop.DBus.GLib.") == 0)
+      EXPECT_TRUE(r.status == 0 || r.err.find("Error: GDBus.Error:org.freedesktop.DBus.GLib.") == 0)
           << m.name << ": " << r.err;
     }
   }
