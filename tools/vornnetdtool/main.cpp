@@ -11,6 +11,7 @@
 #include <string>
 #include <vector>
 
+#include "route_commands.h"
 #include "vornwireless/dbus_net/net_client.h"
 
 #pragma GCC diagnostic ignored "-Wdeprecated-declarations"
@@ -285,9 +286,11 @@ int Run(std::vector<std::string> const& args) {
   std::string const cmd = args[0];
   std::vector<std::string> rest(args.begin() + 1, args.end());
   if (cmd == "--help" || cmd == "-h" || cmd == "help") {
-    std::cout << kUsage;
+    std::cout << kUsage << "\n" << vornnetdtool::kRouteUsage << "\nRouting examples:\n"
+              << vornnetdtool::kRouteExamples;
     return 0;
   }
+  if (vornnetdtool::IsRouteCommand(cmd)) return vornnetdtool::RunRouteCommand(cmd, rest);
   NetClient client;
   if (cmd == "--refresh-gateway") {
     if (rest.size() != 1) throw UsageError{"--refresh-gateway needs one type"};

@@ -63,14 +63,13 @@ bool Given(Json::Value const& request, char const* key) {
   return value.isString() && value.asString() != kNotGiven;
 }
 
-// Interface names as the kernel accepts them: 1 to 15 bytes, no blank, control character, '/'
-// or ':', and none of the characters that would break a section file.
+// Interface names as the kernel reports them, aliases ("eth0:1") included; only what would break
+// a section file is refused: an empty name, a line break or other control character, '[', ']'
+// and '='.
 bool ValidIfname(std::string const& name) {
-  if (name.empty() || name.size() >= IFNAMSIZ || name == "." || name == "..") return false;
+  if (name.empty()) return false;
   for (unsigned char c : name) {
-    if (c <= ' ' || c == 0x7f || c == '/' || c == ':' || c == '[' || c == ']' || c == '=') {
-      return false;
-    }
+    if (c < ' ' || c == 0x7f || c == '[' || c == ']' || c == '=') return false;
   }
   return true;
 }
@@ -98,14 +97,10 @@ bool OptionalString(Json::Value const& request, char const* key) {
   return false;
 }
 
-// An optional address member: absent, null, "NULL", "" (no address) or an IPv4/IPv6 address.
+// An optional address member: absent, null or a string. A text that is no address is stored as
+// the empty address.
 bool OptionalAddress(Json::Value const& request, char const* key) {
-  if (!OptionalString(request, key)) return false;
-  if (!Given(request, key)) return true;
-  std::string const text = request[key].asString();
-  if (text.empty() || !IPAddress(text).IsEmpty()) return true;
-  VORN_LOG(LOG_ERR, "Invalid address [%.64s] for [%s]", text.c_str(), key);
-  return false;
+  return OptionalString(request, key);
 }
 
 // An optional class: absent, null, or a short printable text.
@@ -130,10 +125,14 @@ bool ReadBool(Json::Value const& request, char const* key, bool& out) {
   return true;
 }
 
-// "priority" must be an integral number; numbers beyond int append like any other value
-// outside the list.
+// "priority" must be an integral number; an absent one reads as 0. Numbers beyond int append
+// like any other value outside the list.
 bool ReadPriority(Json::Value const& request, int& priority) {
   Json::Value const& value = request["priority"];
+  if (value.isNull()) {
+    priority = 0;
+    return true;
+  }
   if (!value.isIntegral()) {
     VORN_LOG(LOG_ERR, "Invalid member [%s] in request", "priority");
     return false;
@@ -422,7 +421,8 @@ int RouteModule::IsConfigChanged(Json::Value const& request, char const* member,
   if (!Given(request, member)) return 0;
   Json::Value const& ifname = request["ifname"];
   if (!ifname.isString()) return -1;
-  return IsDatabaseChanged(ifname.asString(), key, request[member].asString());
+  // The stored form: a text that is no address is the empty address.
+  return IsDatabaseChanged(ifname.asString(), key, IPAddress(request[member].asString()).ToString());
 }
 
 int RouteModule::IsGatewayConfigChanged(Json::Value const& request) {
@@ -474,7 +474,7 @@ int RouteModule::AddGatewayInfo(Json::Value const& request) {
   if (Given(request, "gateway")) info._gateway = request["gateway"].asString();
   bool writeDns = false;
   if (Given(request, "dns")) {
-    std::string const dns = request["dns"].asString();
+    std::string const dns = IPAddress(request["dns"].asString()).ToString();
     writeDns = dns != info._dns.ToString();
     info._dns = dns;
   }

@@ -434,8 +434,11 @@ TEST_F(RouteModuleTest, ElevenStoredEntriesComeBackInStringOrderWithoutTheLinkle
       << log.Dump();
   EXPECT_TRUE(log.HasOnce(LOG_INFO, LogLine(kSource, "Interface [rdown] is not up, skip it")))
       << log.Dump();
-  EXPECT_EQ(log.Matching("Policy route tables are not managed in this build").size(), 4u)
-      << log.Dump();
+  // The static table's lookup rule is rebuilt, once per family.
+  auto rules = vorntest::Ip({"rule", "show"}).out;
+  EXPECT_NE(rules.find("2:\tfrom all lookup static-table"), std::string::npos) << rules;
+  auto rules6 = vorntest::Ip({"-6", "rule", "show"}).out;
+  EXPECT_NE(rules6.find("2:\tfrom all lookup static-table"), std::string::npos) << rules6;
   // No route is touched at start.
   EXPECT_EQ(DefaultV4(), "");
   // The next write keeps the order read and removes the others for good.
@@ -625,7 +628,6 @@ TEST_F(RouteModuleTest, BadInputLeavesListsAndFilesAsTheyWere) {
   std::string const route6 = DefaultV6();
   vorntest::ClearFakeJournal();
 
-  std::string const huge(100 * 1024, 'e');
   std::vector<std::pair<Json::Value, std::string>> bad;
   auto add = [&](std::function<void(Json::Value&)> change, std::string const& line) {
     Json::Value r = AddRequest("GTYPE_V4", "eth1", 0, "10.200.2.1", "1.1.1.1", "wan");
@@ -635,23 +637,15 @@ TEST_F(RouteModuleTest, BadInputLeavesListsAndFilesAsTheyWere) {
   add([](Json::Value& r) { r["priority"] = "0"; }, "Invalid member [priority] in request");
   add([](Json::Value& r) { r["priority"] = 1.5; }, "Invalid member [priority] in request");
   add([](Json::Value& r) { r["priority"] = true; }, "Invalid member [priority] in request");
-  add([](Json::Value& r) { r.removeMember("priority"); }, "Invalid member [priority] in request");
   add([](Json::Value& r) { r["type"] = "GTYPE_V5"; }, "Unknown type to add info");
   add([](Json::Value& r) { r["type"] = 0; }, "Unknown type to add info");
   add([](Json::Value& r) { r["ifname"] = 5; }, "Invalid member [ifname] in request");
   add([](Json::Value& r) { r["ifname"] = Json::Value(Json::arrayValue); },
       "Invalid member [ifname] in request");
   add([](Json::Value& r) { r["ifname"] = ""; }, "Invalid interface name []");
-  add([&](Json::Value& r) { r["ifname"] = huge; },
-      "Invalid interface name [" + huge.substr(0, 64) + "]");
-  add([](Json::Value& r) { r["ifname"] = "eth0 eth1"; }, "Invalid interface name [eth0 eth1]");
-  add([](Json::Value& r) { r["ifname"] = "a/b"; }, "Invalid interface name [a/b]");
+  add([](Json::Value& r) { r["ifname"] = "eth]1"; }, "Invalid interface name [eth]1]");
+  add([](Json::Value& r) { r["ifname"] = "a=b"; }, "Invalid interface name [a=b]");
   add([](Json::Value& r) { r["gateway"] = 12; }, "Invalid member [gateway] in request");
-  add([](Json::Value& r) { r["gateway"] = "10.200.2.300"; },
-      "Invalid address [10.200.2.300] for [gateway]");
-  add([](Json::Value& r) { r["gateway"] = "gateway"; }, "Invalid address [gateway] for [gateway]");
-  add([](Json::Value& r) { r["dns"] = "1.1.1.1; rm -rf /"; },
-      "Invalid address [1.1.1.1; rm -rf /] for [dns]");
   add([](Json::Value& r) { r["dns"] = Json::Value(Json::objectValue); },
       "Invalid member [dns] in request");
   add([](Json::Value& r) { r["class"] = "[lan]"; }, "Invalid class [[lan]]");
@@ -676,9 +670,9 @@ TEST_F(RouteModuleTest, BadInputLeavesListsAndFilesAsTheyWere) {
 
   Json::Value copy = Request("COPY_GATEWAY_DATA", "GTYPE_V4");
   copy["interface_source"] = "eth0";
-  copy["interface_destination"] = huge;
+  copy["interface_destination"] = "br[0]";
   copy["interface_source_delete"] = true;
-  bad.emplace_back(copy, "Invalid interface name [" + huge.substr(0, 64) + "]");
+  bad.emplace_back(copy, "Invalid interface name [br[0]]");
   copy["interface_destination"] = "br0";
   copy["interface_source_delete"] = "true";
   bad.emplace_back(copy, "Invalid member [interface_source_delete] in request");
@@ -876,3 +870,46 @@ TEST_F(RouteModuleTest, APriorityFileThatCannotBeReadLeavesTheListAndIsLogged) {
   EXPECT_EQ(m.ReadGatewayListFromFile(GTYPE_V6), 0);
   vorntest::Run({"/bin/rmdir", kV4File});
 }
+
+namespace {
+
+// Corrections seen from a client's side: what the module stores instead of refusing.
+TEST_F(RouteModuleTest, AddressesThatAreNoAddressesAreStoredEmpty) {
+  RouteModule m;
+  Call(m, AddRequest("GTYPE_V4", "eth0", -1, "10.200.1.300", "gateway; rm -rf /", "wan"));
+  EXPECT_EQ(ReadFile(kV4File),
+            "[0]\n\tclass=wan\n\tdns=\n\tgateway=\n\tifname=eth0\n\tslave=no\n");
+  Json::Value request = Request("GET_GATEWAY_DATA_BY_INTERFACE", "GTYPE_V4");
+  request["ifname"] = "eth0";
+  Json::Value response = Call(m, request);
+  EXPECT_EQ(response["exist"], Json::Value(true));
+  EXPECT_EQ(response["gateway"], Json::Value(""));
+  EXPECT_EQ(response["dns"], Json::Value(""));
+}
+
+TEST_F(RouteModuleTest, AbsentPriorityReadsAsZero) {
+  RouteModule m;
+  Call(m, AddRequest("GTYPE_V4", "eth0", -1, "10.200.1.1"));
+  Json::Value r = AddRequest("GTYPE_V4", "eth1", -1, "10.200.2.1");
+  r.removeMember("priority");
+  Call(m, r);
+  EXPECT_EQ(Names(m, GTYPE_V4), (std::vector<std::string>{"eth1", "eth0"}));
+}
+
+TEST_F(RouteModuleTest, AliasNamesCanBeAddedAndDeletedAndLineBreaksAreRefused) {
+  RouteModule m;
+  Call(m, AddRequest("GTYPE_V4", "eth0:1", -1, "10.200.1.1", "NULL", "wan"));
+  EXPECT_EQ(Names(m, GTYPE_V4), (std::vector<std::string>{"eth0:1"}));
+  EXPECT_EQ(ReadFile(kDatabase), "[eth0:1]\n\tdns=\n\tgateway=10.200.1.1\n");
+  Json::Value del = Request("DEL_GATEWAY_DATA", "GTYPE_V4");
+  del["ifname"] = "eth0:1";
+  Call(m, del);
+  EXPECT_TRUE(Names(m, GTYPE_V4).empty());
+  std::string const before = ReadFile(kV4File);
+  Call(m, AddRequest("GTYPE_V4", "eth1\n[x]", -1, "10.200.2.1"));
+  Call(m, AddRequest("GTYPE_V4", "eth1\r", -1, "10.200.2.1"));
+  EXPECT_TRUE(Names(m, GTYPE_V4).empty());
+  EXPECT_EQ(ReadFile(kV4File), before);
+}
+
+}  // namespace
