@@ -70,12 +70,14 @@ int main(int argc, char** argv) {
       return 2;
     }
 
+    // A stop signal that arrives while the modules start (they run commands and may wait for
+    // a file lock) is kept and handled as soon as the loop runs.
+    guint term = g_unix_signal_add(SIGTERM, OnStopSignal, &server);
+    guint intr = g_unix_signal_add(SIGINT, OnStopSignal, &server);
     ModuleManager& manager = ModuleManager::GetInstance();
     if (!manager.Initialize()) NETD_LOG(LOG_ERR, "Failed to initialize network modules");
     if (!manager.Start()) NETD_LOG(LOG_ERR, "Failed to start network modules");
 
-    guint term = g_unix_signal_add(SIGTERM, OnStopSignal, &server);
-    guint intr = g_unix_signal_add(SIGINT, OnStopSignal, &server);
     if (!server.StartLoop()) {
       NETD_LOG(LOG_ERR, "Lost the bus connection");
       status = 3;
