@@ -368,9 +368,12 @@ TEST_F(StaticRouteTest, TableInfoOfARealTableWithUnreachableAndMultipathRoutes) 
   EXPECT_EQ(info["rules"][0]["ip"], Json::Value("10.0.0.0"));
   EXPECT_EQ(info["rules"][0]["gateway"], Json::Value("0.0.0.0"));
   EXPECT_EQ(info["rules"][0]["metric"], Json::Value("0"));
-  // A table the kernel does not know is an error.
+  // A table without routes, or one the kernel cannot name, is shown empty.
   Json::Value none;
-  EXPECT_EQ(route.GetTableInfo(IPTYPE_V4, "nosuch-table", none), -1);
+  EXPECT_EQ(route.GetTableInfo(IPTYPE_V4, "nosuch-table", none), 0);
+  EXPECT_EQ(none["rules"], Json::Value(Json::arrayValue));
+  EXPECT_EQ(route.GetTableInfo(IPTYPE_V4, "9", none), 0);
+  EXPECT_EQ(none["rules"], Json::Value(Json::arrayValue));
 }
 
 }  // namespace
