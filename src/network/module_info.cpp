@@ -1,6 +1,7 @@
 // The daemon's module table, in creation order.
 #include "vornplatform/log.h"
 #include "vornwireless/network/devicelist/device_list_module.h"
+#include "vornwireless/network/ipv6/ipv6_module.h"
 #include "vornwireless/network/module_manager.h"
 #include "vornwireless/network/netlink/netlink_module.h"
 #include "vornwireless/network/route/route_module.h"
@@ -25,7 +26,7 @@ BaseModule* CreateUnavailable() {
 ModuleManager::MODULE_INFO const ModuleManager::module_info[] = {
     {MODULE_TEST, false, TestModule::Create},
     {MODULE_NETLINK, true, NetlinkModule::Create},
-    {MODULE_IPV6, true, CreateUnavailable<MODULE_IPV6>},
+    {MODULE_IPV6, true, IPv6Module::Create},
     {MODULE_ROUTE, true, RouteModule::Create},
     {MODULE_DEVICELIST, true, DeviceListModule::Create},
 };
