@@ -16,6 +16,9 @@
 
 #pragma GCC diagnostic ignored "-Wdeprecated-declarations"
 
+// The IPv6 router commands (ipv6_commands.cpp).
+int RunIpv6Command(std::string const& cmd, std::vector<std::string> const& args, bool* handled);
+
 namespace {
 
 using vornnetwork::dbus::NetClient;
@@ -45,6 +48,13 @@ const char kUsage[] =
     "\n"
     "IPv6:\n"
     "  reset-ipv6 IFNAME                           forget the interface's router advertisement\n"
+    "  ipv6-router create TYPE [JSON]              bring up an IPv6 router: TYPE off, native,\n"
+    "                                              6in4 or 6to4; JSON {\"wan\": ..., ...}\n"
+    "  ipv6-router destroy WAN                     end the router of a WAN and remove its record\n"
+    "  ipv6-router show WAN                        the router record of a WAN\n"
+    "  ipv6-router wan-address WAN IPV4            reconfigure after the WAN's address changed\n"
+    "  ipv6-prefix list                            the /64 prefixes of the routers and their LANs\n"
+    "  ipv6-prefix allocate|deallocate PREFIX LAN  give a prefix to a LAN or take it back\n"
     "\n"
     "  --help                                      this text\n"
     "\n"
@@ -291,6 +301,9 @@ int Run(std::vector<std::string> const& args) {
     return 0;
   }
   if (vornnetdtool::IsRouteCommand(cmd)) return vornnetdtool::RunRouteCommand(cmd, rest);
+  bool ipv6Command = false;
+  const int ipv6Status = RunIpv6Command(cmd, rest, &ipv6Command);
+  if (ipv6Command) return ipv6Status;
   NetClient client;
   if (cmd == "--refresh-gateway") {
     if (rest.size() != 1) throw UsageError{"--refresh-gateway needs one type"};
