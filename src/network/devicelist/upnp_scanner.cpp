@@ -86,6 +86,8 @@ UpnpScanner::UpnpScanner() : _port(49500), _handle(-1), _thread(), _stopRequeste
   pthread_mutex_init(&_stateMutex, nullptr);
   pthread_condattr_t attr;
   pthread_condattr_init(&attr);
+  // Waits count on the monotonic clock: setting the wall clock must not stretch a search.
+  pthread_condattr_setclock(&attr, CLOCK_MONOTONIC);
   pthread_cond_init(&_stateCond, &attr);
   pthread_condattr_destroy(&attr);
 }
@@ -102,7 +104,7 @@ int UpnpScanner::Stop() {
   _stopRequested = true;
   pthread_cond_broadcast(&_stateCond);
   struct timespec deadline;
-  clock_gettime(CLOCK_REALTIME, &deadline);
+  clock_gettime(CLOCK_MONOTONIC, &deadline);
   deadline.tv_sec += kStopWaitSeconds;
   int rc = 0;
   while (IsBoardCasting && rc == 0) rc = pthread_cond_timedwait(&_stateCond, &_stateMutex, &deadline);
@@ -147,7 +149,7 @@ void* UpnpScanner::WaitBoardcastFinish(void* arg) {
     if (rc != UPNP_E_SUCCESS) VORN_LOG(LOG_ERR, "Error UpnpSearchAsync : %d", rc);
     // The search window; a Stop ends it early.
     struct timespec deadline;
-    clock_gettime(CLOCK_REALTIME, &deadline);
+    clock_gettime(CLOCK_MONOTONIC, &deadline);
     deadline.tv_sec += kWaitSeconds;
     pthread_mutex_lock(&self->_stateMutex);
     int wait = 0;

@@ -40,6 +40,11 @@ bool IpStep(std::vector<std::string> const& args, std::string* why) {
 
 }  // namespace
 
+std::string PeerAddr(std::string const& veth) {
+  char const* v = std::getenv(("VORN_PEER_" + veth + "_ADDR").c_str());
+  return v != nullptr ? v : "";
+}
+
 bool SetUpRouterLan(std::string* why) {
   // No duplicate address detection: the UPnP library refuses a tentative link-local address.
   WriteFile("/proc/sys/net/ipv6/conf/default/accept_dad", "0");
@@ -50,7 +55,7 @@ bool SetUpRouterLan(std::string* why) {
          IpStep({"link", "set", "lan0", "master", "br0"}, why) &&
          IpStep({"addr", "add", "10.200.1.2/24", "dev", "br0"}, why) &&
          IpStep({"link", "set", "br0", "up"}, why) &&
-         IpStep({"route", "replace", "default", "via", "10.200.2.1", "dev", "eth0"}, why);
+         IpStep({"route", "replace", "default", "via", PeerAddr("eth0"), "dev", "eth0"}, why);
 }
 
 std::string PeerMac(std::string const& veth) {

@@ -13,6 +13,8 @@ namespace vorntest {
 
 // Builds br0 over lan0 and the WAN default route via eth0's peer. False with a reason.
 bool SetUpRouterLan(std::string* why);
+// The peer host's address of veth NAME (from the sandbox), "" outside one.
+std::string PeerAddr(std::string const& veth);
 // The peer host's MAC of veth NAME (as the kernel prints it, lower case).
 std::string PeerMac(std::string const& veth);
 // Sends one ping from here to ip (the answer fills the neighbour table); the ping's status.
