@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "internal.h"
+#include "vornplatform/child_limit.h"
 #include "vornplatform/err.h"
 #include "vornplatform/log.h"
 
@@ -54,11 +55,14 @@ int RunAction(const char* name, const std::vector<std::string>& args, std::strin
     argv.push_back(const_cast<char*>(path.c_str()));
     for (const auto& a : args) argv.push_back(const_cast<char*>(a.c_str()));
     argv.push_back(nullptr);
-    const internal::SpawnResult r = internal::Spawn(path.c_str(), argv.data(), out, true);
+    const internal::SpawnResult r =
+        internal::Spawn(path.c_str(), argv.data(), out, true, ChildLimitMs(kActionLimitMs));
     if (r.status >= 0) return r.status;
     errno = r.error;
     VLIBC_ERR_SET(VLIBC_ERR_EXEC);
-    if (r.signal != 0) {
+    if (r.timedOut) {
+      // logged with the path and the limit where it was killed
+    } else if (r.signal != 0) {
       VORN_LOG(LOG_ERR, "platform action %s killed by signal %d", name, r.signal);
     } else {
       VORN_LOG(LOG_ERR, "platform action %s cannot run: %s", name, std::strerror(r.error));

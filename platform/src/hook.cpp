@@ -17,6 +17,7 @@
 #include <vector>
 
 #include "internal.h"
+#include "vornplatform/child_limit.h"
 #include "vornplatform/err.h"
 #include "vornplatform/log.h"
 
@@ -68,8 +69,10 @@ std::vector<std::string> HookEnvironment(std::map<std::string, std::string> cons
   return env;
 }
 
-// Runs one program and waits for it; its result is not used. The failure to start it is logged.
-void RunHookProgram(std::string const& path, std::string const& action,
+// Runs one program in a process group of its own and waits for it at most limitMs; its result is
+// not used. The failure to start it is logged. false when it outlived the limit (then it and its
+// group were killed and that was logged).
+bool RunHookProgram(long limitMs, std::string const& path, std::string const& action,
                     std::vector<std::string> const& env) {
   std::vector<char*> argv{const_cast<char*>(path.c_str()), const_cast<char*>(action.c_str()),
                           nullptr};
@@ -90,18 +93,22 @@ void RunHookProgram(std::string const& path, std::string const& action,
   sigdelset(&all, SIGSTOP);
   posix_spawnattr_setsigmask(&attr, &none);
   posix_spawnattr_setsigdefault(&attr, &all);
-  posix_spawnattr_setflags(&attr, POSIX_SPAWN_SETSIGMASK | POSIX_SPAWN_SETSIGDEF);
+  posix_spawnattr_setpgroup(&attr, 0);
+  posix_spawnattr_setflags(&attr,
+                           POSIX_SPAWN_SETSIGMASK | POSIX_SPAWN_SETSIGDEF | POSIX_SPAWN_SETPGROUP);
+  const int64_t deadline = vornplatform::internal::MonotonicMs() + limitMs;
   pid_t pid = -1;
   const int rc = posix_spawn(&pid, path.c_str(), &actions, &attr, argv.data(), envp.data());
   posix_spawnattr_destroy(&attr);
   posix_spawn_file_actions_destroy(&actions);
   if (rc != 0) {
     VORN_LOG(LOG_ERR, "Failed to run hook [%s]: %s", path.c_str(), std::strerror(rc));
-    return;
+    return true;
   }
   int status = 0;
-  while (waitpid(pid, &status, 0) < 0 && errno == EINTR) {
-  }
+  return vornplatform::internal::WaitChildBounded(pid, path.c_str(), limitMs, deadline, &status,
+                                                  -1, nullptr) !=
+         vornplatform::internal::ChildWait::kTimedOut;
 }
 
 }  // namespace
@@ -146,7 +153,16 @@ int BaseHook::ExecHook(int action) {
     if (programs.empty()) return 0;
     const std::vector<std::string> env = HookEnvironment(_envs);
     const std::string actionText = std::to_string(action);
-    for (auto const& name : programs) RunHookProgram(dir + "/" + name, actionText, env);
+    const long limitMs = vornplatform::ChildLimitMs(vornplatform::kHookLimitMs);
+    bool allEnded = true;
+    for (auto const& name : programs) {
+      if (!RunHookProgram(limitMs, dir + "/" + name, actionText, env)) allEnded = false;
+    }
+    if (!allEnded) {
+      errno = ETIMEDOUT;
+      VLIBC_ERR_SET(VLIBC_ERR_EXEC);
+      return -1;
+    }
     return 0;
   });
 }

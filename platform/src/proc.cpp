@@ -14,18 +14,25 @@
 #include <cstdarg>
 #include <cstdlib>
 #include <cstring>
+#include <ctime>
 #include <map>
 #include <string>
 #include <vector>
 
 #include "internal.h"
+#include "vornplatform/child_limit.h"
 #include "vornplatform/err.h"
+#include "vornplatform/log.h"
 
 using vornplatform::internal::AtomicWriteFile;
 using vornplatform::internal::HasText;
 using vornplatform::internal::NoThrow;
 using vornplatform::internal::ReadWholeFile;
+using vornplatform::internal::ChildWait;
+using vornplatform::internal::KillChildGroup;
+using vornplatform::internal::MonotonicMs;
 using vornplatform::internal::SpawnResult;
+using vornplatform::internal::WaitChildBounded;
 
 namespace {
 
@@ -131,13 +138,87 @@ int ResultOf(const SpawnResult& r) {
 int RunArgs(const char* path, std::vector<const char*>& args) {
   args.push_back(nullptr);
   const SpawnResult r =
-      vornplatform::internal::Spawn(path, const_cast<char* const*>(args.data()), nullptr, false);
+      vornplatform::internal::Spawn(path, const_cast<char* const*>(args.data()), nullptr, false,
+                                    vornplatform::ChildLimitMs(vornplatform::kExecLimitMs));
   return ResultOf(r);
 }
 
-// Open streams of VLIBCPopen and the pids behind them; guarded by gForkMutex, so that a child
-// forked meanwhile never inherits it locked.
-std::map<FILE*, pid_t>* gPopenPids = nullptr;
+// A child of VLIBCPopen, from its start until VLIBCPclose reaps it.
+struct PopenChild {
+  pid_t pid = -1;
+  pid_t owner = -1;      // the process that started it (a forked copy of us must not kill it)
+  int64_t deadline = 0;  // MonotonicMs()
+  long limitMs = 0;
+  std::string path;
+  bool killed = false;  // the watchdog killed its group at the deadline
+};
+
+// Open streams of VLIBCPopen and their children; guarded by gForkMutex, so that a child forked
+// meanwhile never inherits it locked.
+std::map<FILE*, PopenChild>* gPopenChildren = nullptr;
+// Wakes the watchdog when a stream is opened (waits with gForkMutex).
+pthread_cond_t gPopenCond;
+// The process whose watchdog thread runs (a forked copy of us has none and starts its own).
+pid_t gWatchdogOwner = -1;
+
+// Kills the group of every stream whose child outlives its deadline while the caller still reads
+// or writes it: the caller's next read sees the end of the stream, and VLIBCPclose fails.
+void* PopenWatchdog(void*) {
+  pthread_mutex_lock(&gForkMutex);
+  for (;;) {
+    int64_t next = -1;
+    const int64_t now = MonotonicMs();
+    const pid_t self = getpid();
+    for (auto& kv : *gPopenChildren) {
+      PopenChild& c = kv.second;
+      if (c.killed || c.owner != self) continue;
+      if (c.deadline <= now) {
+        KillChildGroup(c.pid, c.path.c_str(), c.limitMs);
+        c.killed = true;
+      } else if (next < 0 || c.deadline < next) {
+        next = c.deadline;
+      }
+    }
+    if (next < 0) {
+      pthread_cond_wait(&gPopenCond, &gForkMutex);
+    } else {
+      struct timespec ts;
+      ts.tv_sec = static_cast<time_t>(next / 1000);
+      ts.tv_nsec = static_cast<long>(next % 1000) * 1000000L;
+      pthread_cond_timedwait(&gPopenCond, &gForkMutex, &ts);
+    }
+  }
+}
+
+// With gForkMutex held: the watchdog of this process runs (started on first use). False when it
+// cannot be started; the stream then has no watchdog and VLIBCPclose still bounds its wait.
+bool EnsurePopenWatchdog() {
+  if (gWatchdogOwner == getpid()) return true;
+  static bool condReady = false;
+  if (!condReady) {
+    pthread_condattr_t attr;
+    pthread_condattr_init(&attr);
+    pthread_condattr_setclock(&attr, CLOCK_MONOTONIC);
+    pthread_cond_init(&gPopenCond, &attr);
+    pthread_condattr_destroy(&attr);
+    condReady = true;
+  }
+  pthread_attr_t attr;
+  pthread_attr_init(&attr);
+  pthread_attr_setdetachstate(&attr, PTHREAD_CREATE_DETACHED);
+  pthread_attr_setstacksize(&attr, 64 * 1024);
+  // The watchdog must not take signals meant for the daemon's own threads.
+  sigset_t all, old;
+  sigfillset(&all);
+  pthread_sigmask(SIG_SETMASK, &all, &old);
+  pthread_t thread;
+  const int rc = pthread_create(&thread, &attr, PopenWatchdog, nullptr);
+  pthread_sigmask(SIG_SETMASK, &old, nullptr);
+  pthread_attr_destroy(&attr);
+  if (rc != 0) return false;
+  gWatchdogOwner = getpid();
+  return true;
+}
 
 bool ReadSmallFile(const std::string& path, std::string& out) {
   return ReadWholeFile(path.c_str(), out, 1u << 20) == 0;
@@ -168,7 +249,8 @@ bool ForEachProcess(F&& fn) {
 namespace vornplatform {
 namespace internal {
 
-SpawnResult Spawn(const char* path, char* const argv[], std::string* out, bool nullStdin) {
+SpawnResult Spawn(const char* path, char* const argv[], std::string* out, bool nullStdin,
+                  long limitMs) {
   SpawnResult r;
   int errPipe[2] = {-1, -1};
   int outPipe[2] = {-1, -1};
@@ -189,6 +271,7 @@ SpawnResult Spawn(const char* path, char* const argv[], std::string* out, bool n
     return r;
   }
   if (nullStdin) devNull = open("/dev/null", O_RDONLY | O_CLOEXEC);
+  const int64_t deadline = MonotonicMs() + limitMs;
   const pid_t pid = fork();
   if (pid < 0) {
     r.error = errno;
@@ -196,35 +279,33 @@ SpawnResult Spawn(const char* path, char* const argv[], std::string* out, bool n
     return r;
   }
   if (pid == 0) {
+    setpgid(0, 0);
     ResetSignalsInChild();
     if (outPipe[1] >= 0) MoveFdInChild(outPipe[1], STDOUT_FILENO);
     if (devNull >= 0) MoveFdInChild(devNull, STDIN_FILENO);
     execv(path, argv);
     ReportExecFailure(errPipe[1]);
   }
+  setpgid(pid, pid);  // either side may come first; the group exists before we could kill it
   CloseFd(errPipe[1]);
   CloseFd(outPipe[1]);
   CloseFd(devNull);
   guard.Release();
   const int execErr = ReadExecReport(errPipe[0]);
   CloseFd(errPipe[0]);
-  if (execErr == 0 && out != nullptr) {
-    char buf[4096];
-    for (;;) {
-      ssize_t n = read(outPipe[0], buf, sizeof buf);
-      if (n < 0 && errno == EINTR) continue;
-      if (n <= 0) break;
-      try {
-        out->append(buf, static_cast<std::size_t>(n));
-      } catch (...) {
-        // Out of memory: keep draining so the child is not blocked; the text is cut.
-      }
-    }
-  }
-  CloseFd(outPipe[0]);
   int status = 0;
-  if (WaitChild(pid, &status) != 0) {
+  const int readFd = execErr == 0 ? outPipe[0] : -1;
+  if (readFd < 0) CloseFd(outPipe[0]);
+  outPipe[0] = -1;  // WaitChildBounded closes it
+  const ChildWait w = WaitChildBounded(pid, path, limitMs, deadline, &status, readFd, out);
+  if (w == ChildWait::kError) {
     r.error = errno;
+    return r;
+  }
+  if (w == ChildWait::kTimedOut) {
+    r.timedOut = true;
+    r.signal = SIGKILL;
+    r.error = ETIMEDOUT;
     return r;
   }
   if (execErr != 0) {
@@ -329,6 +410,7 @@ FILE* VLIBCPopen(const char* path, const char* mode, ...) {
   va_end(ap);
   if (rc != 0) return nullptr;
   return NoThrow<FILE*>(nullptr, [&]() -> FILE* {
+    const long limitMs = vornplatform::ChildLimitMs(vornplatform::kPopenLimitMs);
     ForkGuard guard;
     int io[2] = {-1, -1};
     int errPipe[2] = {-1, -1};
@@ -340,6 +422,7 @@ FILE* VLIBCPopen(const char* path, const char* mode, ...) {
     }
     int& mine = reading ? io[0] : io[1];
     int& theirs = reading ? io[1] : io[0];
+    const int64_t deadline = MonotonicMs() + limitMs;
     const pid_t pid = fork();
     if (pid < 0) {
       VLIBC_ERR_SET(VLIBC_ERR_EXEC);
@@ -350,11 +433,13 @@ FILE* VLIBCPopen(const char* path, const char* mode, ...) {
       return nullptr;
     }
     if (pid == 0) {
+      setpgid(0, 0);
       ResetSignalsInChild();
       MoveFdInChild(theirs, reading ? STDOUT_FILENO : STDIN_FILENO);
       execv(path, const_cast<char* const*>(args.data()));
       ReportExecFailure(errPipe[1]);
     }
+    setpgid(pid, pid);
     CloseFd(theirs);
     CloseFd(errPipe[1]);
     guard.Release();
@@ -371,9 +456,16 @@ FILE* VLIBCPopen(const char* path, const char* mode, ...) {
     FILE* fp = fdopen(mine, reading ? "r" : "w");
     if (fp != nullptr) {
       try {
+        PopenChild child;
+        child.pid = pid;
+        child.owner = getpid();
+        child.limitMs = limitMs;
+        child.deadline = deadline;
+        child.path = path;
         ForkGuard lock;
-        if (gPopenPids == nullptr) gPopenPids = new std::map<FILE*, pid_t>();
-        (*gPopenPids)[fp] = pid;
+        if (gPopenChildren == nullptr) gPopenChildren = new std::map<FILE*, PopenChild>();
+        (*gPopenChildren)[fp] = std::move(child);
+        if (EnsurePopenWatchdog()) pthread_cond_signal(&gPopenCond);
         return fp;
       } catch (...) {
         std::fclose(fp);
@@ -381,6 +473,7 @@ FILE* VLIBCPopen(const char* path, const char* mode, ...) {
       }
     }
     CloseFd(mine);
+    kill(-pid, SIGKILL);
     WaitChild(pid, &status);
     VLIBC_ERR_SET(VLIBC_ERR_NO_MEMORY);
     return nullptr;
@@ -392,24 +485,33 @@ int VLIBCPclose(FILE* fp) {
     VLIBC_ERR_SET(VLIBC_ERR_BAD_PARAMETER);
     return -1;
   }
-  pid_t pid = -1;
-  {
+  PopenChild child;
+  bool found = false;
+  NoThrow(0, [&]() -> int {
     ForkGuard lock;
-    if (gPopenPids != nullptr) {
-      auto it = gPopenPids->find(fp);
-      if (it != gPopenPids->end()) {
-        pid = it->second;
-        gPopenPids->erase(it);
+    if (gPopenChildren != nullptr) {
+      auto it = gPopenChildren->find(fp);
+      if (it != gPopenChildren->end()) {
+        child = std::move(it->second);
+        gPopenChildren->erase(it);
+        found = true;
       }
     }
-  }
-  if (pid < 0) {
+    return 0;
+  });
+  if (!found) {
     VLIBC_ERR_SET(VLIBC_ERR_BAD_PARAMETER);  // not a stream of VLIBCPopen
     return -1;
   }
   std::fclose(fp);
   int status = 0;
-  if (WaitChild(pid, &status) != 0) {
+  // A child the watchdog has killed (and logged) is reaped at once.
+  const ChildWait w =
+      child.killed ? (WaitChild(child.pid, &status) == 0 ? ChildWait::kExited : ChildWait::kError)
+                   : WaitChildBounded(child.pid, child.path.c_str(), child.limitMs,
+                                      child.deadline, &status, -1, nullptr);
+  if (w != ChildWait::kExited || child.killed) {
+    if (w == ChildWait::kTimedOut || child.killed) errno = ETIMEDOUT;
     VLIBC_ERR_SET(VLIBC_ERR_EXEC);
     return -1;
   }

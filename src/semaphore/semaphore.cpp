@@ -4,6 +4,7 @@
 #include <sys/sem.h>
 
 #include <cerrno>
+#include <ctime>
 
 #include "vornplatform/log.h"
 
@@ -27,7 +28,10 @@ int Semaphore::Enter() {
   int id = -1;
   if (Get(&id) < 0) return -1;
   struct sembuf op = {0, -1, SEM_UNDO};
-  if (semop(id, &op, 1) < 0) {
+  struct timespec limit;
+  limit.tv_sec = static_cast<time_t>(_waitLimitMs / 1000);
+  limit.tv_nsec = (_waitLimitMs % 1000) * 1000000L;
+  if (semtimedop(id, &op, 1, &limit) < 0) {
     VORN_LOG(LOG_ERR, "semop fail semid %d errno %d", id, errno);
     return -1;
   }

@@ -2,7 +2,9 @@
 // firing it runs every executable file of VORN_HOOK_DIR/<name>/ in name order (byte order of the
 // names), one after the other, without a shell: argv[0] is the file's path, argv[1] the action
 // number in decimal, and the hook's variables are added to the environment of the caller. stdin
-// is /dev/null. What the executables return is not used.
+// is /dev/null. What the executables return is not used. Each executable runs in a process group
+// of its own and has kHookLimitMs (child_limit.h) to finish; one that outlives it is killed with
+// its group and the hook's firing fails, after the remaining executables have run.
 #ifndef VORNPLATFORM_HOOK_H
 #define VORNPLATFORM_HOOK_H
 
@@ -33,7 +35,8 @@ class BaseHook {
   // "." or ".." components. Hooks with required variables add their own tests.
   virtual bool IsValid() const;
   // Fires the hook with the action number. 0 when it was fired (also with no executable
-  // installed); -1 when IsValid() is false (nothing runs, error register: bad parameter).
+  // installed); -1 when IsValid() is false (nothing runs, error register: bad parameter) or an
+  // executable outlived its limit (error register: exec, errno ETIMEDOUT).
   int ExecHook(int action);
 
   std::string const& GetCategory() const { return _category; }
@@ -57,7 +60,8 @@ typedef struct _VLIB_PLUGIN* PVLIB_PLUGIN;
 int VLIBPluginSDKInit(const char* category, const char* name, PVLIB_PLUGIN* handle);
 // Sets one variable of the handle. 0; -1 (bad handle, key or value).
 int VLIBPluginSetArg(PVLIB_PLUGIN handle, const char* key, const char* value);
-// Fires the hook with action VLIB_PLUGIN_ACTION. 0; -1 for a bad handle.
+// Fires the hook with action VLIB_PLUGIN_ACTION. 0; -1 for a bad handle or an executable that
+// outlived its limit.
 int VLIBPluginAction_S(PVLIB_PLUGIN handle);
 // Frees the handle; NULL is fine. 0.
 int VLIBPluginExit(PVLIB_PLUGIN handle);

@@ -4,7 +4,9 @@
 // of a child can only be collected while SIGCHLD is not set to SIG_IGN and no other code reaps it
 // (waitpid(-1, ...)); otherwise the call reports -1. The fork functions below and the child
 // starts here are serialized, so that a child forked by one thread never holds the pipes of a
-// program another thread is starting.
+// program another thread is starting. Every program runs as the leader of a process group of its
+// own under a time limit (child_limit.h): one that outlives it is killed with its group, logged,
+// and the call reports -1 (VLIBCPclose) or -1/NULL as for a program that could not run.
 #ifndef VORNPLATFORM_PROC_H
 #define VORNPLATFORM_PROC_H
 

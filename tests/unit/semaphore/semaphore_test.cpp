@@ -137,3 +137,19 @@ TEST_F(SemaphoreTest, AHolderThatDiesIsUndone) {
   EXPECT_EQ(0, sem.Enter());
   EXPECT_EQ(0, sem.Release());
 }
+
+TEST_F(SemaphoreTest, EnterGivesUpWhenTheHolderKeepsItPastTheWaitLimit) {
+  const unsigned key = 0x5a0007;
+  Semaphore holder(key);
+  ASSERT_EQ(0, holder.Enter());
+  vorntest::SyslogCapture log;
+  Semaphore waiter(key, 300);
+  EXPECT_EQ(-1, waiter.Enter());
+  EXPECT_EQ(1u, log.Matching("^semaphore/semaphore.cpp:[0-9]+ semop fail semid [0-9]+ errno " +
+                             std::to_string(EAGAIN) + "$")
+                    .size())
+      << log.Dump();
+  EXPECT_EQ(0, SemValue(key));  // still held, untouched by the waiter that gave up
+  ASSERT_EQ(0, holder.Release());
+  EXPECT_FALSE(IpcsListsKey(key));
+}
