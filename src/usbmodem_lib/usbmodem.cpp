@@ -29,6 +29,21 @@ const char kWvdialPath[] = "/usr/bin/wvdial";
 const char kPeersFile[] = "/etc/ppp/peers/wvdial";
 const char kPidFilePrefix[] = "/tmp/usbmodem.pid.";
 const char kWvdialLogPrefix[] = "/var/lib/usbmodem/wvdial.log.";
+// How long Disconnect waits for a stopped dialler to let go of its node (it hangs up the line
+// and stops pppd first), in steps of kDiallerEndStepMs.
+const int kDiallerEndWaitMs = 15000;
+const int kDiallerEndStepMs = 100;
+
+// Waits until pid has ended (a zombie counts as ended), at most kDiallerEndWaitMs. True when it
+// has.
+bool WaitForDiallerEnd(pid_t pid) {
+  if (pid <= 0) return true;
+  for (int waited = 0; waited < kDiallerEndWaitMs; waited += kDiallerEndStepMs) {
+    if (VLIBCProcAlive(pid) != 1) return true;
+    usleep(kDiallerEndStepMs * 1000);
+  }
+  return VLIBCProcAlive(pid) != 1;
+}
 
 // A profile value as text: strings as they are, booleans as "true"/"false", anything else empty.
 std::string ProfileText(Json::Value const& profile, const char* key) {
@@ -485,10 +500,13 @@ int USBModem::NetConnectSteps(unsigned int) {
     return -1;
   }
   unlink(logFile.c_str());
-  if (VLIBCFileTouch(logFile.c_str()) < 0) {
+  // The dialler's log holds its chat with the network: readable by its owner only from the start.
+  const int logFd = open(logFile.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | O_NOCTTY, 0600);
+  if (logFd < 0) {
     VORN_LOG(LOG_ERR, "Error on init logfile %s, but continue", logFile.c_str());
   } else {
-    chmod(logFile.c_str(), 0600);
+    fchmod(logFd, 0600);
+    close(logFd);
   }
 
   if (BackgroundExec(kWvdialPath, init, baud, phone, modem, username, password, _pidFile,
@@ -528,10 +546,17 @@ int USBModem::NetDisconnect() {
     VORN_LOG(LOG_ERR, "failed on disconnect, cannot find pidfile %s", _pidFile.c_str());
     return -1;
   }
+  const pid_t dialler = VLIBCReadPidFile(_pidFile.c_str());
   if (VLIBCProcSignalByPidFile(_pidFile.c_str(), SIGTERM, 0, 0) != 0) {
     VORN_LOG(LOG_ERR, "failed on disconnect with sending signal %d with pidfile %s", SIGTERM,
              _pidFile.c_str());
     return -1;
+  }
+  // A one-port dongle's node goes back to the queries below: while the dialler still runs it
+  // holds the node (and its lock), and the next query could not open it.
+  if (!WaitForDiallerEnd(dialler)) {
+    VORN_LOG(LOG_WARNING, "dialler %d still running %d ms after SIGTERM", static_cast<int>(dialler),
+             kDiallerEndWaitMs);
   }
   unlink(_pidFile.c_str());
   _pidFile.clear();

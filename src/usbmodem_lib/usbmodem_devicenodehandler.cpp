@@ -9,6 +9,7 @@
 
 #include "vornplatform/file.h"
 #include "vornplatform/log.h"
+#include "vornwireless/usbmodem_lib/usbmodem_secret_mask.h"
 
 namespace vornwireless {
 namespace usbmodem_lib {
@@ -262,7 +263,7 @@ int USBModem_DeviceNodeHandler::ModemCmd(std::string const& cmd, std::string& re
   std::string line = cmd + "\r";
   _modem->write(line.data(), line.size());
   if (!_modem->isok() || !_modem->select(kReplyTimeoutMs, true, false)) {
-    VORN_LOG(LOG_ERR, "No respond on modem cmd %s", cmd.c_str());
+    VORN_LOG(LOG_ERR, "No respond on modem cmd %s", MaskSecretsInCommand(cmd).c_str());
     return -1;
   }
 
@@ -276,7 +277,7 @@ int USBModem_DeviceNodeHandler::ModemCmd(std::string const& cmd, std::string& re
   }
   if (length == 0) {
     // Readable without data: the line hung up (the dongle went away).
-    VORN_LOG(LOG_ERR, "No respond on modem cmd %s", cmd.c_str());
+    VORN_LOG(LOG_ERR, "No respond on modem cmd %s", MaskSecretsInCommand(cmd).c_str());
     return -1;
   }
   std::string data(buffer, length);

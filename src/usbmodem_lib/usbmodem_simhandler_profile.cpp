@@ -1,5 +1,6 @@
 // The dial profile of a SIM: one section in /var/lib/usbmodem/usbmodem.profile.<IMSI>, made
 // from what the SIM and the network list tell on first use, read and updated key by key.
+#include <fcntl.h>
 #include <sys/stat.h>
 #include <sys/types.h>
 #include <unistd.h>
@@ -57,6 +58,16 @@ bool MemberText(Json::Value const& member, std::string& text) {
   return true;
 }
 
+// Creates path (when missing) readable by its owner only, from the first byte on: it holds
+// secrets. 0; -1 with errno set.
+int CreatePrivateFile(std::string const& path) {
+  const int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_CLOEXEC | O_NOCTTY, 0600);
+  if (fd < 0) return -1;
+  const int rc = fchmod(fd, 0600);
+  close(fd);
+  return rc;
+}
+
 }  // namespace
 
 int USBModem_SIMHandler::InitProfile() {
@@ -99,7 +110,7 @@ int USBModem_SIMHandler::ResetProfile() {
     }
   }
   if (VLIBCFileExist(_profilePath.c_str()) == 1) unlink(_profilePath.c_str());
-  if (VLIBCFileTouch(_profilePath.c_str()) < 0) {
+  if (CreatePrivateFile(_profilePath) < 0) {
     VORN_LOG(LOG_ERR, "Error on reset profile: touch profile %s", _profilePath.c_str());
   }
   PVLIBSZHASH hash = VLIBCSzHashAlloc(kHashSize);
