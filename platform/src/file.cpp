@@ -311,6 +311,16 @@ std::string FormatLine(const char* fmt, const std::string& key, const std::strin
   return out;
 }
 
+// As FormatLine, but a value that would not read back as written (blanks at either end, or
+// double quotes at both ends, which the reader strips) is written in double quotes.
+std::string FormatLineExact(const char* fmt, const std::string& key, const std::string& value) {
+  std::string line = FormatLine(fmt, key, value);
+  KeyLine parsed;
+  if (ParseKeyLine(line, '=', &parsed) && parsed.value == value) return line;
+  std::string quoted = FormatLine(fmt, key, "\"" + value + "\"");
+  return ParseKeyLine(quoted, '=', &parsed) && parsed.value == value ? quoted : line;
+}
+
 // Key and value a writer may store: they read back as written.
 int CheckKey(const char* key) {
   if (!HasText(key)) return VLIBC_ERR_BAD_PARAMETER;
@@ -784,7 +794,9 @@ int VLIBCFileAddSection(const char* path, const char* name, PVLIBSZHASH hash, co
     std::vector<std::string> lines;
     if (LoadLines(path, true, &lines) != 0) return -1;
     lines.push_back(std::string("[") + name + "]");
-    for (const auto& kv : HashPairs(hash)) lines.push_back(FormatLine(fmt, kv.first, kv.second));
+    for (const auto& kv : HashPairs(hash)) {
+      lines.push_back(FormatLineExact(fmt, kv.first, kv.second));
+    }
     return StoreLines(path, lines) == 0 ? 1 : -1;
   });
 }
@@ -799,7 +811,7 @@ int VLIBCFileSetSection(const char* path, const char* name, PVLIBSZHASH hash, co
     const SectionSpan* span = FindSection(spans, name);
     if (span == nullptr) {
       lines.push_back(std::string("[") + name + "]");
-      for (const auto& kv : pairs) lines.push_back(FormatLine(fmt, kv.first, kv.second));
+      for (const auto& kv : pairs) lines.push_back(FormatLineExact(fmt, kv.first, kv.second));
       return StoreLines(path, lines) == 0 ? 1 : -1;
     }
     std::map<std::string, std::string> wanted(pairs.begin(), pairs.end());
@@ -813,7 +825,7 @@ int VLIBCFileSetSection(const char* path, const char* name, PVLIBSZHASH hash, co
       if (ParseKeyLine(lines[i], '=', &kl)) {
         auto it = wanted.find(kl.key);
         if (it != wanted.end() && placed.insert(kl.key).second) {
-          out.push_back(FormatLine(fmt, it->first, it->second));
+          out.push_back(FormatLineExact(fmt, it->first, it->second));
           insertAt = out.size();
         }
         continue;
@@ -822,7 +834,7 @@ int VLIBCFileSetSection(const char* path, const char* name, PVLIBSZHASH hash, co
     }
     std::vector<std::string> added;
     for (const auto& kv : pairs) {
-      if (placed.count(kv.first) == 0) added.push_back(FormatLine(fmt, kv.first, kv.second));
+      if (placed.count(kv.first) == 0) added.push_back(FormatLineExact(fmt, kv.first, kv.second));
     }
     out.insert(out.begin() + static_cast<long>(insertAt), added.begin(), added.end());
     out.insert(out.end(), lines.begin() + static_cast<long>(span->end), lines.end());

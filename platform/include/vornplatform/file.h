@@ -74,6 +74,9 @@ int VLIBCFileEnumSection(const char* path, PVLIBSZLIST* list);
 // Keys of section name into *hash (emptied first; allocated when NULL). The number of keys; 0
 // for an empty or missing section; -1 on error (missing or unreadable file).
 int VLIBCFileGetSection(const char* path, const char* name, PVLIBSZHASH* hash);
+// The two section writers below store a value that would not read back as written (blanks at
+// either end, or double quotes at both ends) in double quotes, so that it reads back as given.
+//
 // Appends "[name]" and the hash's keys in fmt to the file (made when missing). 1, or -1.
 // The caller makes sure the section is not there yet.
 int VLIBCFileAddSection(const char* path, const char* name, PVLIBSZHASH hash, const char* fmt);
