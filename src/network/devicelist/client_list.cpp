@@ -66,6 +66,17 @@ std::string KeyState(Json::Value const& device, char const* key) {
   return value.isString() ? "s" + value.asString() : std::string("o");
 }
 
+void SetIfDifferent(Json::Value& device, char const* key, std::string const& text) {
+  Json::Value& member = device[key];
+  if (!member.isString() || member.asString() != text) member = text;
+}
+
+std::string DisplayName(Json::Value const& device) {
+  std::string name;
+  ClientList::DetermineDisplayName(device, name);
+  return name;
+}
+
 }  // namespace
 
 ClientList::ClientList() : _document(Json::objectValue) {
@@ -195,19 +206,21 @@ bool ClientList::UpdateKeys(char const* key, std::string const& value, Json::Val
   try {
     unsigned int index = 0;
     if (VerifyIsExist(key, value, index)) {
-      // The device is changed on a copy, so a failure part-way leaves the stored one whole.
-      Json::Value device = (*DeviceArray(_document))[index];
-      std::string const oldMac = KeyState(device, "macAddr");
-      std::string const oldIp = KeyState(device, "ipAddr");
-      for (auto it = object.begin(); it != object.end(); ++it) device[it.name()] = *it;
-      if (oldMac != KeyState(device, "macAddr") || oldIp != KeyState(device, "ipAddr")) {
+      // Changed in place; members whose value is already the same are left untouched.
+      Json::Value& device = (*DeviceArray(_document))[index];
+      bool const keysGiven = object.isMember("macAddr") || object.isMember("ipAddr");
+      std::string const oldMac = keysGiven ? KeyState(device, "macAddr") : std::string();
+      std::string const oldIp = keysGiven ? KeyState(device, "ipAddr") : std::string();
+      for (auto it = object.begin(); it != object.end(); ++it) {
+        Json::Value& member = device[it.name()];
+        if (!(member == *it)) member = *it;
+      }
+      if (keysGiven &&
+          (oldMac != KeyState(device, "macAddr") || oldIp != KeyState(device, "ipAddr"))) {
         _indexValid = false;  // a key moved: the lookup index no longer holds
       }
-      std::string name;
-      DetermineDisplayName(device, name);
-      device["displayName"] = name;
-      device["asso_time"] = now;
-      (*DeviceArray(_document))[index].swap(device);
+      SetIfDifferent(device, "displayName", DisplayName(device));
+      SetIfDifferent(device, "asso_time", now);
       return true;
     }
     if (!create) return true;
@@ -330,12 +343,18 @@ void ClientList::DetermineDisplayName(Json::Value const& object, std::string& na
 }
 
 std::string ClientList::GetLocalTime() {
+  // The text changes once a second; a merge of many devices formats it once.
+  thread_local time_t cachedAt = static_cast<time_t>(-1);
+  thread_local std::string cached;
   time_t now = time(nullptr);
+  if (now == cachedAt) return cached;
   struct tm local;
   char text[64] = "";
   if (localtime_r(&now, &local) == nullptr) return std::string();
   strftime(text, sizeof(text), "%T %G/%m/%d", &local);
-  return text;
+  cachedAt = now;
+  cached = text;
+  return cached;
 }
 
 }  // namespace module
