@@ -40,7 +40,6 @@ const char kIpCommand[] = "/sbin/ip";
 const int kExeclFlags = 187;
 const char kInfoFile[] = "/etc/vorninfo.conf";
 const char kConfigDir[] = "/etc/iproute2/config";
-const size_t kMaxClassLength = 64;
 
 // RAII for the platform's string list.
 struct SzList {
@@ -103,13 +102,13 @@ bool OptionalAddress(Json::Value const& request, char const* key) {
   return OptionalString(request, key);
 }
 
-// An optional class: absent, null, or a short printable text.
+// An optional class: absent, null, or a text that fits on one line of the priority file.
 bool OptionalClass(Json::Value const& request) {
   if (!OptionalString(request, "class")) return false;
   if (!Given(request, "class")) return true;
   std::string const text = request["class"].asString();
-  bool ok = text.size() <= kMaxClassLength;
-  for (unsigned char c : text) ok = ok && c >= ' ' && c != 0x7f && c != '[' && c != ']';
+  bool ok = true;
+  for (unsigned char c : text) ok = ok && c >= ' ' && c != 0x7f;
   if (!ok) VORN_LOG(LOG_ERR, "Invalid class [%.64s]", text.c_str());
   return ok;
 }

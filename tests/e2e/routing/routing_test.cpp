@@ -217,12 +217,35 @@ TEST_F(Routing, ElevenStaticRulesThroughTheToolComeBackAfterARestart) {
   // Sections 0, 1, 10, 2 (off), 3 (unreachable gateway), 4 ... 9.
   EXPECT_EQ(active, "EEEDDEEEEEE");
 
+  // IPv6: a host route, an address with host bits (added as its network, reported inactive),
+  // a network and a disabled rule.
+  r = Tool({"route", "set-static", "-6",
+            R"([{"ifname": "eth0", "ip": "2001:db8:51::7", "mask": "128",
+                 "gateway": "2001:db8:1::1", "enable": true},
+                {"ifname": "eth0", "ip": "2001:db8:52::9", "mask": "64",
+                 "gateway": "2001:db8:1::1", "enable": true},
+                {"ifname": "eth0", "ip": "2001:db8:50::", "mask": "48",
+                 "gateway": "2001:db8:1::1", "enable": true},
+                {"ifname": "eth0", "ip": "2001:db8:53::", "mask": "48",
+                 "gateway": "2001:db8:1::1", "enable": false}])"});
+  ASSERT_EQ(0, r.status) << r.err;
+  r = Tool({"route", "get-static", "-6"});
+  got = Parse(r.out);
+  active.clear();
+  for (auto const& rule : got) active += rule["active"].asString().substr(0, 1);
+  EXPECT_EQ(active, "EDED") << r.out;
+  std::string const expected6 = Routes("static-table", true);
+  EXPECT_NE(expected6.find("2001:db8:52::/64 via 2001:db8:1::1 dev eth0"), std::string::npos);
+  EXPECT_EQ(expected6.find("2001:db8:53::"), std::string::npos);
+
   // The table emptied by hand, then a daemon restart: the enabled rules are back, in no other
   // table.
   vorntest::Ip({"route", "flush", "table", "static-table"});
+  vorntest::Ip({"-6", "route", "flush", "table", "static-table"});
   ASSERT_EQ(Routes("static-table"), "");
   Restart();
   EXPECT_EQ(Routes("static-table"), expected);
+  EXPECT_EQ(Routes("static-table", true), expected6);
   std::string const all = vorntest::Ip({"route", "show", "table", "all"}).out;
   size_t start = 0;
   int gatewayRoutes = 0;
