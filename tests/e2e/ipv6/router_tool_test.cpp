@@ -101,6 +101,34 @@ TEST_F(RouterToolTest, SixInFourBringsUpTheTunnelWithItsAddressAndGatewayEntry) 
   EXPECT_EQ("IPV6ROUTER=no\n", vorntest::ReadFile(std::string(kIfcfgDir) + "/ifcfg-eth0"));
 }
 
+TEST_F(RouterToolTest, TheLiveGatewayDatabaseOutranksTheRecordsDefaultGatewayFlag) {
+  vorntest::IpOk({"addr", "add", "203.0.113.5/24", "dev", "eth0"});
+  // Another uplink holds the first place of the IPv6 list.
+  RunResult r = Tool({"gateway", "add", "--ifname", "eth1", "--type", "v6", "--priority", "0",
+                      "--gateway", "::", "--class", "ethernet"});
+  ASSERT_EQ(0, r.status) << r.err;
+  r = Tool({"ipv6-router", "create", "6in4",
+            "{\"wan\": \"eth0\", \"prefix\": \"2001:db8:100::/48\", \"remote_addr_v4\": "
+            "\"198.51.100.1\", \"local_addr_v6\": \"2001:db8:ffff::2/64\", "
+            "\"is_default_gateway\": false}"});
+  ASSERT_EQ(0, r.status) << r.err;
+  ASSERT_EQ("eth1=:: 6in4-eth0=::", V6Gateways());
+  // The record holds the key (which alone reads as true); the database places the tunnel second,
+  // so it is not the default gateway.
+  EXPECT_NE(std::string::npos, vorntest::ReadFile(std::string(kRecords) + "/ipv6-eth0")
+                                   .find("\tis_default_gateway=no\n"));
+  r = Tool({"ipv6-router", "show", "eth0"});
+  ASSERT_EQ(0, r.status) << r.err;
+  Json::Value shown;
+  ASSERT_TRUE(Json::Reader().parse(r.out, shown));
+  EXPECT_FALSE(shown["is_default_gateway"].asBool()) << r.out;
+  // Once the tunnel leads the list, the same record reads as the default gateway.
+  ASSERT_EQ(0, Tool({"gateway", "del", "--ifname", "eth1", "--type", "v6"}).status);
+  r = Tool({"ipv6-router", "show", "eth0"});
+  ASSERT_TRUE(Json::Reader().parse(r.out, shown));
+  EXPECT_TRUE(shown["is_default_gateway"].asBool()) << r.out;
+}
+
 TEST_F(RouterToolTest, SixToFourOnAPrivateOnlyWanFailsWithCode3) {
   RunResult r = Tool({"ipv6-router", "create", "6to4", "{\"wan\": \"eth0\"}"});
   EXPECT_EQ(3, r.status);

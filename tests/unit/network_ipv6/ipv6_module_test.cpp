@@ -235,6 +235,14 @@ TEST_F(IPv6ModuleTest, TheFirstRouterAdvertisingAgainRestartsThe900Seconds) {
   EXPECT_EQ(first, module.GetContext("eth0").gateway);
 }
 
+TEST_F(IPv6ModuleTest, TheAgeOfTheLastRaCountsBothWaysWhenTheClockJumps) {
+  Feed("fe80::1", Managed());
+  module.now -= 899;
+  EXPECT_FALSE(module.IsRaExchangeable("eth0"));
+  module.now -= 2;
+  EXPECT_TRUE(module.IsRaExchangeable("eth0"));
+}
+
 TEST_F(IPv6ModuleTest, ASecondRouterTakesOverAtOnceWhenTheFirstDoesNotAnswer) {
   Feed(kSilent, Managed());
   module.now += 5;
