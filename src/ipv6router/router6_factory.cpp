@@ -43,7 +43,9 @@ std::string Router6Factory::SixToFourPrefix(std::string const& localV4) {
 
 bool Router6Factory::RequiredMember(Json::Value const& config, char const* name,
                                     std::string& value) {
-  if (!config.isObject() || !config.isMember(name) || !config[name].isString()) {
+  // Numbers and booleans read as their text, as jsoncpp gives them; objects and arrays have none.
+  if (!config.isObject() || !config.isMember(name) ||
+      !(config[name].isString() || config[name].isNumeric() || config[name].isBool())) {
     VORN_LOG(LOG_ERR, "Missing field: %s", name);
     _error = ERROR_BAD_PARAMETER;
     return false;
@@ -55,7 +57,8 @@ bool Router6Factory::RequiredMember(Json::Value const& config, char const* name,
 bool Router6Factory::DefaultGatewayMember(Json::Value const& config, bool& value) {
   value = false;
   if (!config.isObject() || !config.isMember("is_default_gateway")) return true;
-  if (!config["is_default_gateway"].isBool()) {
+  // Booleans, numbers and null read as jsoncpp reads them; a text is no boolean.
+  if (!config["is_default_gateway"].isConvertibleTo(Json::booleanValue)) {
     VORN_LOG(LOG_ERR, "Missing field: %s", "is_default_gateway");
     _error = ERROR_BAD_PARAMETER;
     return false;

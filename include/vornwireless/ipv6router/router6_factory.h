@@ -46,9 +46,9 @@ class Router6Factory {
   bool newDHCPPDAttr(Json::Value const& config, Router6Attr& attr);
   // The first public IPv4 address of wan; false (error 3) when it has none.
   bool PublicIPv4(std::string const& wan, std::string& address);
-  // A required string member; false (error 2) when it is missing or not a string.
+  // A required member as text; false (error 2) when it is missing, an object or an array.
   bool RequiredMember(Json::Value const& config, char const* name, std::string& value);
-  // The optional boolean is_default_gateway; false (error 2) when it is not a boolean.
+  // The optional is_default_gateway; false (error 2) when it cannot be read as a boolean.
   bool DefaultGatewayMember(Json::Value const& config, bool& value);
 
   int _error;

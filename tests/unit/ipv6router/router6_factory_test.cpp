@@ -103,8 +103,17 @@ TEST_F(Router6FactoryTest, SixInFourNeedsItsMembersInOrder) {
       << log.Dump();
 
   Router6Factory wrongType;
-  EXPECT_EQ(nullptr, wrongType.newRouterV6Instance("6in4", Parse("{\"wan\": 5}")));
+  EXPECT_EQ(nullptr, wrongType.newRouterV6Instance("6in4", Parse("{\"wan\": [\"eth0\"]}")));
   EXPECT_EQ(2, wrongType.GetError());
+  Router6Factory textFlag;
+  EXPECT_EQ(nullptr, textFlag.newRouterV6Instance(
+                         "native", Parse("{\"wan\": \"eth0\", \"is_default_gateway\": \"yes\"}")));
+  EXPECT_EQ(2, textFlag.GetError());
+  Router6Factory numberFlag;
+  std::unique_ptr<Router6Base> numbered(numberFlag.newRouterV6Instance(
+      "native", Parse("{\"wan\": \"eth0\", \"is_default_gateway\": 1}")));
+  ASSERT_NE(nullptr, numbered);
+  EXPECT_TRUE(numbered->GetAttr().is_default_gateway);
 
   Router6Factory ok;
   std::unique_ptr<Router6Base> router(ok.newRouterV6Instance(
