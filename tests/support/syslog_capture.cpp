@@ -1,5 +1,6 @@
 #include "support/syslog_capture.h"
 
+#include <gtest/gtest.h>
 #include <syslog.h>
 #include <unistd.h>
 
@@ -36,7 +37,11 @@ std::string EscapeRegex(const std::string& text) {
 SyslogCapture::SyslogCapture() {
   const char* p = std::getenv("VORN_SYSLOG_FILE");
   path_ = p ? p : "";
-  if (path_.empty()) return;
+  if (path_.empty()) {
+    // Without the catcher every "nothing was logged" would pass unseen.
+    ADD_FAILURE() << "no syslog catcher (VORN_SYSLOG_FILE is not set): run the test in the sandbox";
+    return;
+  }
   Sync();
   std::ifstream in(path_, std::ios::binary | std::ios::ate);
   offset_ = in ? static_cast<long>(in.tellg()) : 0;
@@ -54,7 +59,9 @@ void SyslogCapture::Sync() {
   marker << "vorn-syslog-sync-" << getpid() << "-" << ++counter;
   syslog(LOG_DEBUG, "%s", marker.str().c_str());
   const std::string want = marker.str();
-  auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
+  // Generous: the catcher shares a loaded machine. A marker that never comes fails the test,
+  // since the lines read after it could then be incomplete.
+  auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
   while (std::chrono::steady_clock::now() < deadline) {
     std::ifstream in(path_, std::ios::binary);
     std::string line;
@@ -65,6 +72,7 @@ void SyslogCapture::Sync() {
     }
     std::this_thread::sleep_for(std::chrono::milliseconds(5));
   }
+  ADD_FAILURE() << "the syslog marker " << want << " did not reach " << path_ << " within 30 s";
 }
 
 std::vector<SyslogLine> SyslogCapture::Lines() {

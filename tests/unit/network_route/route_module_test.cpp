@@ -209,7 +209,7 @@ TEST_F(RouteModuleTest, PriorityMinus2KeepsThePlaceAndLeavesTheResolverFileAlone
   EXPECT_EQ(Names(m, GTYPE_V4), (std::vector<std::string>{"eth0", "eth1", "ppp0", "ppp1"}));
 }
 
-TEST_F(RouteModuleTest, PrioritiesInsertWhereSpecified) {
+TEST_F(RouteModuleTest, PriorityInRangeInsertsThereAndAnyOtherAppends) {
   RouteModule m;
   for (char const* name : {"a0", "a1", "a2"}) Call(m, AddRequest("GTYPE_V4", name, -1));
   EXPECT_EQ(Names(m, GTYPE_V4), (std::vector<std::string>{"a0", "a1", "a2"}));
@@ -758,7 +758,7 @@ TEST_F(RouteModuleTest, IsDatabaseChangedComparesWithTheStoredValue) {
   EXPECT_TRUE(log.HasOnce(LOG_ERR, LogLine(kSource, "Unknown type"))) << log.Dump();
 }
 
-TEST_F(RouteModuleTest, AnUnwritableDirectoryFailsWithTheSpecifiedLines) {
+TEST_F(RouteModuleTest, UnwritableConfigDirectoryLogsTheFileAndKeepsItsContent) {
   RouteModule m;
   Call(m, AddRequest("GTYPE_V4", "eth0", -1, "10.200.1.1", "8.8.8.8"));
   std::string const before = ReadFile(kV4File);

@@ -1068,7 +1068,7 @@ TEST(DeviceNodeHandlerSim, ThreeNodeDongleWithConnectNode) {
                    "nodes": [{"name": "0"}, {"name": "1", "silent": true}, {"name": "2"}],
                    "connect_node": "0", "manufacturer": "simulated", "model": "SIM-1"})",
                75);
-  if (!sim.available()) GTEST_SKIP() << "modem simulator not there";
+  ASSERT_TRUE(sim.available()) << "modem simulator not there";
   ASSERT_TRUE(sim.ready());
   USBModem_DeviceNodeHandler h(75);
   USBModem_DeviceNodeHandlerTestPeer peer(h);
@@ -1095,7 +1095,7 @@ TEST(DeviceNodeHandlerSim, BuggyDongleAnswersAfterItsCutLine) {
   ModemSim sim(R"({"vendor": "12d1", "product": "1506", "prefix": "/dev/ttyACM",
                    "nodes": [{"name": "0", "unterminated": 1}]})",
                76);
-  if (!sim.available()) GTEST_SKIP() << "modem simulator not there";
+  ASSERT_TRUE(sim.available()) << "modem simulator not there";
   ASSERT_TRUE(sim.ready());
   SyslogCapture log;
   USBModem_DeviceNodeHandler h(76);
@@ -1111,7 +1111,7 @@ TEST(DeviceNodeHandlerSim, BusySimDelaysInit) {
   ModemSim sim(R"({"vendor": "2001", "product": "7d01", "prefix": "/dev/ttyUSB",
                    "nodes": [{"name": "3"}], "sim": {"state": "ready", "busy_queries": 1}})",
                77);
-  if (!sim.available()) GTEST_SKIP() << "modem simulator not there";
+  ASSERT_TRUE(sim.available()) << "modem simulator not there";
   ASSERT_TRUE(sim.ready());
   SyslogCapture log;
   USBModem_DeviceNodeHandler h(77);

@@ -192,7 +192,7 @@ TEST(ConfigSection, WriteUnderARegularFileFailsToMakeTheDirectory) {
 }
 
 TEST(ConfigSection, FailedRenameLeavesOldFileAndNoTemporaryFile) {
-  if (!vorntest::InSandbox()) GTEST_SKIP() << "needs the sandbox (mounts)";
+  ASSERT_TRUE(vorntest::InSandbox()) << "needs the sandbox (mounts)";
   TempDir dir;
   const std::string path = dir / "keep.conf";
   ASSERT_TRUE(vorntest::WriteFile(path, "[old]\n\tk=old\n", 0600));
@@ -213,7 +213,7 @@ TEST(ConfigSection, FailedRenameLeavesOldFileAndNoTemporaryFile) {
 }
 
 TEST(ConfigSection, TemporaryFileThatCannotBeCreatedFailsAndKeepsTheOldFile) {
-  if (!vorntest::InSandbox()) GTEST_SKIP() << "needs the sandbox (mounts)";
+  ASSERT_TRUE(vorntest::InSandbox()) << "needs the sandbox (mounts)";
   TempDir dir;
   const std::string path = dir / "ro.conf";
   ASSERT_TRUE(vorntest::WriteFile(path, "[old]\n\tk=old\n", 0600));
@@ -365,7 +365,7 @@ TEST(ConfigNoSection, ReadOfMissingFileFailsWithLogLine) {
 }
 
 TEST(ConfigNoSection, WriteOnAReadOnlyFileSystemFailsToTouch) {
-  if (!vorntest::InSandbox()) GTEST_SKIP() << "needs the sandbox (mounts)";
+  ASSERT_TRUE(vorntest::InSandbox()) << "needs the sandbox (mounts)";
   TempDir dir;
   ASSERT_TRUE(vorntest::WriteFile(dir / "ro.conf", "old=1\n"));
   vorntest::ReadOnlyMount ro(dir.path());

@@ -54,7 +54,7 @@ TEST(SetProcEntry, WritesValueAndNewline) {
 }
 
 TEST(SetProcEntry, WritesARealProcEntry) {
-  if (!vorntest::InSandbox()) GTEST_SKIP() << "needs the sandbox (own network namespace)";
+  ASSERT_TRUE(vorntest::InSandbox()) << "needs the sandbox (own network namespace)";
   const std::string entry = "/proc/sys/net/ipv4/conf/lo/arp_ignore";
   EXPECT_TRUE(SetProcEntry(entry, "1"));
   EXPECT_EQ("1\n", ReadFile(entry));
@@ -65,7 +65,7 @@ TEST(SetProcEntry, WritesARealProcEntry) {
 class CopyIfcfg : public ::testing::Test {
  protected:
   void SetUp() override {
-    if (!vorntest::InSandbox()) GTEST_SKIP() << "needs the sandbox (/etc overlay)";
+    ASSERT_TRUE(vorntest::InSandbox()) << "needs the sandbox (/etc overlay)";
     ASSERT_EQ(0, CheckAndMakeDir("/etc/sysconfig/network-scripts", 0755));
   }
 };
