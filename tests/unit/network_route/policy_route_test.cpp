@@ -365,4 +365,16 @@ TEST_F(PolicyRouteTest, ReleasingAFailedLockLeavesTheHoldersFile) {
   EXPECT_FALSE(vorntest::Exists("/tmp/lock/lock_rt_tables"));
 }
 
+TEST_F(PolicyRouteTest, ReleasingASharedLockKeepsTheFileWhileAnotherHolderShares) {
+  vorntest::Run({"/bin/mkdir", "-p", "/tmp/lock"});
+  vornwireless::utils::FileLock first("/tmp/lock/shared", false);
+  vornwireless::utils::FileLock second("/tmp/lock/shared", false);
+  ASSERT_TRUE(first.Lock());
+  ASSERT_TRUE(second.Lock());
+  EXPECT_TRUE(first.Unlock());
+  EXPECT_TRUE(vorntest::Exists("/tmp/lock/shared"));
+  EXPECT_TRUE(second.Unlock());
+  EXPECT_FALSE(vorntest::Exists("/tmp/lock/shared"));
+}
+
 }  // namespace

@@ -377,3 +377,41 @@ TEST_F(StaticRouteTest, TableInfoOfARealTableWithUnreachableAndMultipathRoutes) 
 }
 
 }  // namespace
+
+namespace {
+
+// Seeded random listing lines (printable words, blanks, tabs, slashes, keywords, long lines):
+// the parser never crashes and always leaves the four text keys and a metric.
+TEST(StaticRouteParse, RandomListingLinesNeverBreakTheParser) {
+  unsigned seed = 20261125;
+  auto next = [&seed]() {
+    seed = seed * 1103515245u + 12345u;
+    return (seed >> 8) & 0xffffff;
+  };
+  char const* words[] = {"via", "dev", "metric", "default", "unreachable", "nexthop", "10.0.0.0/8",
+                         "/", "//", "1.2.3.4/999", "-1", "mon.hb0", "\t", " ", "::/0", "fe80::1"};
+  for (int round = 0; round < 20000; ++round) {
+    std::string line;
+    int const count = static_cast<int>(next() % 12);
+    for (int i = 0; i < count; ++i) {
+      if (next() % 3 == 0) {
+        int const len = static_cast<int>(next() % (next() % 50 == 0 ? 1500 : 12));
+        for (int k = 0; k < len; ++k) line += static_cast<char>(33 + next() % 94);
+      } else {
+        line += words[next() % (sizeof words / sizeof words[0])];
+      }
+      line += next() % 5 == 0 ? "\t" : " ";
+    }
+    if (next() % 2) line += "\n";
+    Json::Value route(Json::objectValue);
+    auto type = next() % 2 ? IPTYPE_V4 : IPTYPE_V6;
+    StaticRoute::ParseRouteLine(type, line, route);
+    ASSERT_TRUE(route["ip"].isString()) << line;
+    ASSERT_TRUE(route["metric"].isString()) << line;
+    if (type == IPTYPE_V4) {
+      ASSERT_TRUE(route["mask"].isString()) << line;
+    }
+  }
+}
+
+}  // namespace
