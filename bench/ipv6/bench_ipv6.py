@@ -69,15 +69,18 @@ def main():
         sender.stdin.flush()
         return sender.stdout.readline().strip()
 
-    print("vornnetd IPv6 router advertisement watch, %d RAs per run (scapy from the peer host)"
+    print("vornnetd IPv6 router advertisement watch, up to %d RAs per run (scapy from the peer host)"
           % COUNT)
-    for flip in (False, True):
+    runs = [("same state:", ""), ("flags flipping:", " flip"),
+            ("same state, 500/s:", " rate=500"), ("flipping, 50/s:", " flip rate=50")]
+    for label, options in runs:
+        count = COUNT if "rate" not in options else min(COUNT, 1000 if "500" in options else 200)
         # Settle: one RA decides the state first.
         ask("ra")
         time.sleep(0.5)
         before = processed()
         start = time.monotonic()
-        sent = ask("flood %d%s" % (COUNT, " flip" if flip else ""))
+        sent = ask("flood %d%s" % (count, options))
         m = re.match(r"sent (\d+) in ([0-9.]+) s", sent)
         send_rate = int(m.group(1)) / max(float(m.group(2)), 1e-9)
         last, last_change = before, time.monotonic()
@@ -85,14 +88,13 @@ def main():
             now = processed()
             if now != last:
                 last, last_change = now, time.monotonic()
-            if now - before >= COUNT:
+            if now - before >= count:
                 break
             time.sleep(0.02)
         handled = last - before
-        elapsed = (last_change if handled < COUNT else time.monotonic()) - start
+        elapsed = (last_change if handled < count else time.monotonic()) - start
         print("  %-22s sent %6.0f RA/s   handled %5d of %d (%5.1f%%) at %7.0f RA/s"
-              % ("flags flipping:" if flip else "same state:", send_rate, handled, COUNT,
-                 100.0 * handled / COUNT, handled / elapsed))
+              % (label, send_rate, handled, count, 100.0 * handled / count, handled / elapsed))
 
     latencies = []
     for _ in range(TRIALS):
