@@ -1,9 +1,9 @@
-// A burst of address events on a veth, consumed by two readers at once: NetlinkModule (its own
-// socket and polling loop) and `ip monitor address`. Prints the time each needs to have consumed
-// every event, counted from the start of the producer (`ip -batch`). Asserts nothing.
-// With --daemon, the consumer is the real vornnetd instead, timed by a marker event after the burst.
-//   bench_netlink [--count N] [--dev IF] [--timeout S] [--daemon PATH]
-//   (inside the sandbox, with --veth eth0; --daemon needs its bus)
+// A burst of address events on a veth, consumed by the real vornnetd and by `ip monitor address`
+// at once. Prints the CPU time each spends per event and how long each needs to have consumed
+// every event. Asserts nothing. vornnetd's end is a marker: the cable of a second veth pulled after
+// the burst, whose link-down action its watcher runs only after every earlier message.
+//   bench_netlink --daemon PATH [--count N] [--dev IF] [--timeout S] [--rcvbuf BYTES]
+//   (inside the sandbox, with --veth eth0 and its bus)
 #include <linux/rtnetlink.h>
 #include <signal.h>
 #include <spawn.h>
@@ -23,18 +23,12 @@
 #include <thread>
 #include <vector>
 
-#include "vornwireless/network/netlink/netlink_module.h"
-
 extern char** environ;
 
 namespace {
 
 using Clock = std::chrono::steady_clock;
 
-std::atomic<long> g_moduleEvents{0};
-std::atomic<long> g_moduleErrors{0};
-std::atomic<long long> g_moduleLastNs{0};
-std::atomic<long long> g_moduleCpuNs{0};
 std::atomic<long> g_monitorEvents{0};
 std::atomic<long long> g_monitorLastNs{0};
 Clock::time_point g_origin;
@@ -42,50 +36,6 @@ Clock::time_point g_origin;
 long long Now() {
   return std::chrono::duration_cast<std::chrono::nanoseconds>(Clock::now() - g_origin).count();
 }
-
-// The module's own loop, with one addition: before the module reads a datagram, the bench peeks
-// at it and counts the address messages in it; the count is published after the module handled
-// them.
-class CountingNetlinkModule : public vornnetwork::network::module::NetlinkModule {
- public:
-  int StartPolling() override {
-    pthread_setcancelstate(PTHREAD_CANCEL_DISABLE, nullptr);
-    const int fd = GetNetlinkFd();
-    if (fd < 0) return 0;
-    InitInterface();
-    std::vector<char> peek(4096);
-    for (;;) {
-      fd_set set;
-      FD_ZERO(&set);
-      FD_SET(fd, &set);
-      timeval tv{6, 0};
-      pthread_setcancelstate(PTHREAD_CANCEL_ENABLE, nullptr);
-      const int ready = select(fd + 1, &set, nullptr, nullptr, &tv);
-      pthread_setcancelstate(PTHREAD_CANCEL_DISABLE, nullptr);
-      if (ready < 1) continue;
-      const ssize_t n = recv(fd, peek.data(), peek.size(), MSG_PEEK | MSG_DONTWAIT);
-      if (n < 0) {
-        if (errno != EAGAIN && errno != EINTR) ++g_moduleErrors;  // ENOBUFS: events were lost
-        continue;
-      }
-      long count = 0;
-      ssize_t left = n;
-      for (nlmsghdr* h = reinterpret_cast<nlmsghdr*>(peek.data()); NLMSG_OK(h, left);
-           h = NLMSG_NEXT(h, left)) {
-        if (h->nlmsg_type == RTM_NEWADDR || h->nlmsg_type == RTM_DELADDR) ++count;
-      }
-      AnalysisNetlinkMessage();
-      timespec cpu;
-      if (clock_gettime(CLOCK_THREAD_CPUTIME_ID, &cpu) == 0) {
-        g_moduleCpuNs = cpu.tv_sec * 1000000000LL + cpu.tv_nsec;
-      }
-      if (count > 0) {
-        g_moduleEvents += count;
-        g_moduleLastNs = Now();
-      }
-    }
-  }
-};
 
 pid_t Spawn(const std::vector<std::string>& args, int* outFd, int inFd = -1) {
   int pipeFd[2] = {-1, -1};
@@ -246,6 +196,8 @@ int RunDaemon(const std::string& daemon, int count, const std::string& dev, doub
   std::thread reader(ReadMonitor, monitorFd);
   WaitUntil([] { return false; }, 0.3);  // let ip monitor subscribe
   const long monitorBase = g_monitorEvents;
+  const double monitorCpuBase = ProcessCpuSeconds(monitor);
+  const int resyncBase = SyslogCount("Netlink events lost");
   const long expected = 2L * count;
   const long long start = Now();
   const int rcAdd = IpBatch(Commands("add", count, dev));
@@ -255,6 +207,8 @@ int RunDaemon(const std::string& daemon, int count, const std::string& dev, doub
   const double marked = Mark(timeout);
   const long long consumed = Now();
   const double cpu = ProcessCpuSeconds(pid) - cpuBase;
+  const double monitorCpu = ProcessCpuSeconds(monitor) - monitorCpuBase;
+  const long monitorGot = g_monitorEvents - monitorBase;
   kill(monitor, SIGTERM);
   waitpid(monitor, nullptr, 0);
   reader.join();
@@ -273,9 +227,13 @@ int RunDaemon(const std::string& daemon, int count, const std::string& dev, doub
     std::printf("%-28s %10.3f s  (the marker's own latency on an idle daemon: %.1f ms)\n",
                 "vornnetd, all consumed", seconds(consumed) - idle, idle * 1000);
   }
-  std::printf("vornnetd recv errors (events lost to overflow): %d\n",
-              SyslogCount("recvmsg ret") - lostBase);
-  std::printf("vornnetd CPU for the burst: %.3f s (%.1f us/event)\n", cpu, cpu * 1e6 / expected);
+  std::printf("vornnetd recv errors: %d, losses that made it read the state again: %d\n",
+              SyslogCount("recvmsg ret") - lostBase, SyslogCount("Netlink events lost") - resyncBase);
+  std::printf("%-28s %10s %14s\n", "CPU", "seconds", "us/event");
+  std::printf("%-28s %10.3f %14.1f\n", "vornnetd", cpu, cpu * 1e6 / expected);
+  std::printf("%-28s %10.3f %14.1f  (%ld events seen)\n", "ip monitor address", monitorCpu,
+              monitorGot > 0 ? monitorCpu * 1e6 / monitorGot : 0.0, monitorGot);
+  if (monitorCpu > 0) std::printf("vornnetd / ip monitor CPU ratio: %.2f\n", cpu / monitorCpu);
   return 0;
 }
 
@@ -290,109 +248,17 @@ int main(int argc, char** argv) {
     if (std::strcmp(argv[i], "--count") == 0) count = std::atoi(argv[i + 1]);
     if (std::strcmp(argv[i], "--dev") == 0) dev = argv[i + 1];
     if (std::strcmp(argv[i], "--timeout") == 0) timeout = std::atof(argv[i + 1]);
+    if (std::strcmp(argv[i], "--rcvbuf") == 0) setenv("VORN_NETLINK_RCVBUF", argv[i + 1], 1);
   }
   if (count < 1 || count > 60000) {
     std::fprintf(stderr, "--count must be 1..60000\n");
     return 2;
   }
+  if (daemon.empty()) {
+    std::fprintf(stderr, "usage: bench_netlink --daemon PATH [--count N] [--dev IF] [--timeout S] "
+                         "[--rcvbuf BYTES]\n");
+    return 2;
+  }
   g_origin = Clock::now();
-  if (!daemon.empty()) return RunDaemon(daemon, count, dev, timeout);
-
-  int monitorFd = -1;
-  const pid_t monitor = Spawn({"/sbin/ip", "monitor", "address"}, &monitorFd);
-  if (monitor <= 0) {
-    std::perror("ip monitor");
-    return 1;
-  }
-  std::thread reader(ReadMonitor, monitorFd);
-
-  CountingNetlinkModule module;
-  if (module.Initialize() != 0 || module.Start() != 0) {
-    std::fprintf(stderr, "the module did not start\n");
-    return 1;
-  }
-  {
-    int rcvbuf = 0;
-    socklen_t len = sizeof rcvbuf;
-    getsockopt(module.GetNetlinkFd(), SOL_SOCKET, SO_RCVBUF, &rcvbuf, &len);
-    std::printf("module socket receive buffer: %d bytes\n", rcvbuf);
-  }
-
-  // Warm-up: both readers must see one add and one delete before the burst.
-  const std::string warm = "address add 10.99.99.99/32 dev " + dev +
-                           "\naddress del 10.99.99.99/32 dev " + dev + "\n";
-  // (ip monitor subscribes some time after it was started: repeat until it has seen a pair.)
-  bool warmedUp = false;
-  for (int i = 0; i < 50 && !warmedUp; ++i) {
-    if (IpBatch(warm) != 0) break;
-    warmedUp = WaitUntil([] { return g_moduleEvents >= 2 && g_monitorEvents >= 2; }, 0.2);
-  }
-  if (!warmedUp) {
-    std::fprintf(stderr, "warm-up events did not arrive (module %ld, monitor %ld)\n",
-                 g_moduleEvents.load(), g_monitorEvents.load());
-    module.Terminate();
-    kill(monitor, SIGTERM);
-    waitpid(monitor, nullptr, 0);
-    reader.join();
-    return 1;
-  }
-  // Let the last warm-up pair arrive at both before the counts are taken.
-  std::this_thread::sleep_for(std::chrono::milliseconds(200));
-  const long long cpuBase = g_moduleCpuNs;
-  const double monitorCpuBase = ProcessCpuSeconds(monitor);
-  const long moduleBase = g_moduleEvents;
-  const long monitorBase = g_monitorEvents;
-  const long errorBase = g_moduleErrors;
-  const long expected = 2L * count;
-
-  const std::string adds = Commands("add", count, dev);
-  const std::string dels = Commands("del", count, dev);
-  const long long start = Now();
-  const int rcAdd = IpBatch(adds);
-  const int rcDel = IpBatch(dels);
-  const long long produced = Now();
-  // Until both have everything, or (a reader lost events) nothing arrived for 2 s.
-  long lastSeen = -1;
-  auto quietSince = Clock::now();
-  WaitUntil(
-      [&] {
-        const long seen = g_moduleEvents + g_monitorEvents;
-        if (seen != lastSeen) {
-          lastSeen = seen;
-          quietSince = Clock::now();
-        }
-        return (g_moduleEvents - moduleBase >= expected &&
-                g_monitorEvents - monitorBase >= expected) ||
-               Clock::now() - quietSince > std::chrono::seconds(2);
-      },
-      timeout);
-
-  const double monitorCpu = ProcessCpuSeconds(monitor) - monitorCpuBase;
-  module.Terminate();
-  kill(monitor, SIGTERM);
-  waitpid(monitor, nullptr, 0);
-  reader.join();
-  const double moduleCpu = (g_moduleCpuNs - cpuBase) / 1e9;
-
-  const long moduleGot = g_moduleEvents - moduleBase;
-  const long monitorGot = g_monitorEvents - monitorBase;
-  auto seconds = [&](long long ns) { return (ns - start) / 1e9; };
-  std::printf("address events: %d additions + %d removals on %s (ip -batch exit %d/%d), no hook\n",
-              count, count, dev.c_str(), rcAdd, rcDel);
-  std::printf("%-28s %10s %12s %14s\n", "consumer", "events", "of expected", "all consumed");
-  std::printf("%-28s %10.3f s\n", "producer (ip -batch)", seconds(produced));
-  std::printf("%-28s %10ld %12ld %12.3f s%s\n", "NetlinkModule", moduleGot, expected,
-              seconds(g_moduleLastNs), moduleGot >= expected ? "" : "  (incomplete: last event)");
-  std::printf("%-28s %10ld %12ld %12.3f s%s\n", "ip monitor address", monitorGot, expected,
-              seconds(g_monitorLastNs), monitorGot >= expected ? "" : "  (incomplete: last event)");
-  std::printf("NetlinkModule recv errors (ENOBUFS, events lost): %ld\n",
-              g_moduleErrors.load() - errorBase);
-  std::printf("CPU time: NetlinkModule thread %.3f s (%.1f us/event), ip monitor %.3f s (%.1f us/event)\n",
-              moduleCpu, moduleGot > 0 ? moduleCpu * 1e6 / moduleGot : 0.0, monitorCpu,
-              monitorGot > 0 ? monitorCpu * 1e6 / monitorGot : 0.0);
-  if (moduleGot > 0 && monitorGot > 0) {
-    std::printf("module / ip monitor time ratio: %.2f\n",
-                seconds(g_moduleLastNs) / seconds(g_monitorLastNs));
-  }
-  return 0;
+  return RunDaemon(daemon, count, dev, timeout);
 }

@@ -217,3 +217,24 @@ int VLIBPluginExit(PVLIB_PLUGIN handle) {
   delete handle;
   return 0;
 }
+
+int VLIBPluginHasAction(const char* name) {
+  if (name == nullptr || !ValidHookName(name)) return 0;
+  return vornplatform::internal::NoThrow(0, [&]() -> int {
+    const std::string dir = std::string(VORN_HOOK_DIR) + "/" + name;
+    DIR* d = opendir(dir.c_str());
+    if (d == nullptr) return 0;
+    int found = 0;
+    while (struct dirent* e = readdir(d)) {
+      if (std::strcmp(e->d_name, ".") == 0 || std::strcmp(e->d_name, "..") == 0) continue;
+      const std::string path = dir + "/" + e->d_name;
+      struct stat st;
+      if (stat(path.c_str(), &st) == 0 && S_ISREG(st.st_mode) && access(path.c_str(), X_OK) == 0) {
+        found = 1;
+        break;
+      }
+    }
+    closedir(d);
+    return found;
+  });
+}

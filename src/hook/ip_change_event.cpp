@@ -47,6 +47,9 @@ int NetIPChangeEvent(_tag_IPTYPE type, std::string const& ifname, std::string co
     return -1;
   }
   char const* name = type == IPTYPE_IPV4 ? "net/ipv4_change" : "net/ipv6_change";
+  // Nothing installed: nothing to run, so neither the link test nor the variables are needed
+  // (this keeps an address flood cheap on a box without listeners).
+  if (VLIBPluginHasAction(name) == 0) return 0;
 
   const int link = VORNNetIfIsLink(ifname.c_str());
   if (link < 0) {

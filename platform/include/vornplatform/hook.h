@@ -66,4 +66,9 @@ int VLIBPluginAction_S(PVLIB_PLUGIN handle);
 // Frees the handle; NULL is fine. 0.
 int VLIBPluginExit(PVLIB_PLUGIN handle);
 
+// Whether firing the hook `name` ("net/ipv4_change") would run anything: 1 when its directory
+// below VORN_HOOK_DIR holds an executable file, 0 when not or for an unusable name. Lets a caller
+// skip preparing the variables of a hook that nothing is installed for.
+int VLIBPluginHasAction(const char* name);
+
 #endif

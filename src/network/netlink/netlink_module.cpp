@@ -5,19 +5,23 @@
 #include <arpa/inet.h>
 #include <linux/rtnetlink.h>
 #include <net/if.h>
-#include <sys/select.h>
+#include <poll.h>
+#include <signal.h>
+#include <sys/eventfd.h>
 #include <sys/socket.h>
+#include <sys/syscall.h>
+#include <time.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstdint>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <exception>
+#include <fstream>
 #include <memory>
-
-#if defined(__SANITIZE_ADDRESS__)
-#include <sanitizer/asan_interface.h>
-#endif
+#include <set>
 
 #include "vornplatform/err.h"
 #include "vornplatform/file.h"
@@ -42,27 +46,30 @@ namespace {
 const char kIfcfgPrefix[] = "/etc/sysconfig/network-scripts/ifcfg-";
 const char kOVSBondFlagFormat[] = "/tmp/ovs_bond_hook_flag_%s";
 const int kPollSeconds = 6;
-const int kRecvBufferSize = 4096;
+// A datagram cut short grows the receive buffer up to this size.
+const std::size_t kMaxRecvBufferBytes = 1024 * 1024;
 // Receive buffer of the socket (the kernel doubles it for its own bookkeeping).
 const int kSocketBufferBytes = 4 * 1024 * 1024;
+// Environment variable that sets the socket's receive buffer instead (bytes).
+const char kRecvBufferKnob[] = "VORN_NETLINK_RCVBUF";
+// Datagrams read in one go before the thread looks at its stop flag and the socket again.
+const int kDatagramsPerWake = 256;
+// Queued datagrams dropped at most before the state is read again (a flood that never pauses
+// must not keep the thread from reading it).
+const long kMaxDroppedDatagrams = 1000000;
+// A dump that does not answer within this time fails (the state stays to be read).
+const int kDumpTimeoutSeconds = 5;
+// A dump interrupted by changes is read again this many times at most.
+const int kDumpAttempts = 5;
+// How long TerminateModule waits for the thread at most once the children it waits for are
+// being killed; it then logs and waits for it without end.
+const int kStopKillPhaseMs = 10000;
+// The flags of a link that matter to the link events.
+const unsigned int kLinkFlagsMask = IFF_UP | IFF_RUNNING | IFF_SLAVE | 0x10000;
 const int kInterfaceCapacity = 32;
 const int kInterfaceKind = 3;
 const int kGatewayHookAction = 5;
 const unsigned int kRunningWithoutLowerUpMask = 0x10040;  // IFF_LOWER_UP | IFF_RUNNING
-
-// Cancellation unwinds the polling thread's frames without the address sanitizer's knowledge, so
-// their poisoned red zones would outlive them; in such builds this guard clears them on the way
-// out. It does nothing otherwise.
-struct UnwindGuard {
-  UnwindGuard() = default;
-  UnwindGuard(UnwindGuard const&) = delete;
-  UnwindGuard& operator=(UnwindGuard const&) = delete;
-  ~UnwindGuard() {
-#if defined(__SANITIZE_ADDRESS__)
-    __asan_handle_no_return();
-#endif
-  }
-};
 
 bool StartsWith(std::string const& text, char const* prefix) {
   return text.compare(0, std::strlen(prefix), prefix) == 0;
@@ -106,6 +113,125 @@ int ClearOVSBondFlag(std::string const& path) {
   return 0;
 }
 
+int64_t MonotonicMs() {
+  struct timespec ts;
+  clock_gettime(CLOCK_MONOTONIC, &ts);
+  return static_cast<int64_t>(ts.tv_sec) * 1000 + ts.tv_nsec / 1000000;
+}
+
+// The interface flags and name of a link message held as bytes (checked when it was stored).
+unsigned int StoredLinkFlags(std::string const& bytes) {
+  ifinfomsg info;
+  std::memcpy(&info, bytes.data() + NLMSG_HDRLEN, sizeof info);
+  return info.ifi_flags;
+}
+
+std::string StoredLinkName(std::string const& bytes) {
+  int remaining = static_cast<int>(bytes.size()) - static_cast<int>(NLMSG_LENGTH(sizeof(ifinfomsg)));
+  std::size_t offset = NLMSG_LENGTH(sizeof(ifinfomsg));
+  while (remaining >= static_cast<int>(sizeof(rtattr))) {
+    rtattr attr;
+    std::memcpy(&attr, bytes.data() + offset, sizeof attr);
+    if (attr.rta_len < sizeof(rtattr) || static_cast<int>(attr.rta_len) > remaining) break;
+    if (attr.rta_type == IFLA_IFNAME) {
+      char const* data = bytes.data() + offset + RTA_LENGTH(0);
+      return std::string(data, strnlen(data, attr.rta_len - RTA_LENGTH(0)));
+    }
+    const int step = static_cast<int>(RTA_ALIGN(attr.rta_len));
+    remaining -= step;
+    offset += static_cast<std::size_t>(step);
+  }
+  return "";
+}
+
+// An aligned, writable copy of a stored message, to hand to a Check* operation.
+class MessageCopy {
+ public:
+  explicit MessageCopy(std::string const& bytes) : _words((bytes.size() + 7) / 8 + 1, 0) {
+    std::memcpy(_words.data(), bytes.data(), bytes.size());
+  }
+  nlmsghdr* Header() { return reinterpret_cast<nlmsghdr*>(_words.data()); }
+  template <typename T>
+  T* Body() { return static_cast<T*>(NLMSG_DATA(Header())); }
+
+ private:
+  std::vector<uint64_t> _words;
+};
+
+// Sends one dump request and collects its answers of type `want`: links by index, addresses by
+// key (with their order). 0; 1 when the dump was interrupted by changes; -1 on failure.
+int ReadDump(int fd, uint16_t type, uint32_t seq, std::vector<char>& buffer,
+             NetlinkModule::KernelState& state, std::vector<std::string>* order) {
+  struct {
+    nlmsghdr header;
+    ifinfomsg body;  // an ifaddrmsg request uses its first 8 bytes
+  } request;
+  std::memset(&request, 0, sizeof request);
+  request.header.nlmsg_len = type == RTM_GETLINK ? NLMSG_LENGTH(sizeof(ifinfomsg))
+                                                 : NLMSG_LENGTH(sizeof(ifaddrmsg));
+  request.header.nlmsg_type = type;
+  request.header.nlmsg_flags = NLM_F_REQUEST | NLM_F_DUMP;
+  request.header.nlmsg_seq = seq;
+  request.body.ifi_family = AF_UNSPEC;
+  struct sockaddr_nl kernel;
+  std::memset(&kernel, 0, sizeof kernel);
+  kernel.nl_family = AF_NETLINK;
+  if (sendto(fd, &request, request.header.nlmsg_len, 0, reinterpret_cast<sockaddr*>(&kernel),
+             sizeof kernel) < 0) {
+    const int err = errno;
+    VORN_LOG(LOG_ERR, "Failed to ask the kernel for its state with err=[%d][%s]", err,
+             std::strerror(err));
+    return -1;
+  }
+  const uint16_t answer = type == RTM_GETLINK ? RTM_NEWLINK : RTM_NEWADDR;
+  bool interrupted = false;
+  for (;;) {
+    struct sockaddr_nl from;
+    std::memset(&from, 0, sizeof from);
+    struct iovec iov = {buffer.data(), buffer.size()};
+    struct msghdr msg;
+    std::memset(&msg, 0, sizeof msg);
+    msg.msg_name = &from;
+    msg.msg_namelen = sizeof from;
+    msg.msg_iov = &iov;
+    msg.msg_iovlen = 1;
+    const ssize_t n = recvmsg(fd, &msg, MSG_TRUNC);
+    if (n < 0 && errno == EINTR) continue;
+    if (n < 0) {
+      const int err = errno;
+      VORN_LOG(LOG_ERR, "Failed to read the kernel's state with err=[%d][%s]", err,
+               std::strerror(err));
+      return -1;
+    }
+    if ((msg.msg_flags & MSG_TRUNC) != 0 || static_cast<std::size_t>(n) > buffer.size()) {
+      if (static_cast<std::size_t>(n) <= kMaxRecvBufferBytes) buffer.resize(NLMSG_ALIGN(n) + 4096);
+      return 1;  // read again with the larger buffer
+    }
+    if (from.nl_pid != 0) continue;
+    int remaining = static_cast<int>(n);
+    for (nlmsghdr* h = reinterpret_cast<nlmsghdr*>(buffer.data()); NLMSG_OK(h, remaining);
+         h = NLMSG_NEXT(h, remaining)) {
+      if (h->nlmsg_seq != seq) continue;
+      if ((h->nlmsg_flags & NLM_F_DUMP_INTR) != 0) interrupted = true;
+      if (h->nlmsg_type == NLMSG_DONE) return interrupted ? 1 : 0;
+      if (h->nlmsg_type == NLMSG_ERROR) {
+        VORN_LOG(LOG_ERR, "The kernel refused to give its state (type [%u])", type);
+        return -1;
+      }
+      if (h->nlmsg_type != answer) continue;
+      const std::string bytes(reinterpret_cast<char const*>(h), h->nlmsg_len);
+      if (answer == RTM_NEWLINK) {
+        if (h->nlmsg_len < NLMSG_LENGTH(sizeof(ifinfomsg))) continue;
+        state.links[static_cast<ifinfomsg*>(NLMSG_DATA(h))->ifi_index] = bytes;
+      } else {
+        const std::string key = NetlinkModule::AddressKey(h);
+        if (key.empty()) continue;
+        if (state.addresses.emplace(key, bytes).second) order->push_back(key);
+      }
+    }
+  }
+}
+
 }  // namespace
 
 NetlinkModule::NetlinkModule()
@@ -115,11 +241,19 @@ NetlinkModule::NetlinkModule()
       _ipv4Map("none"),
       _ipv6Map(),
       _linkMap(false),
-      _threadStarted(false) {}
+      _threadStarted(false),
+      _wakeFd(-1),
+      _stopRequested(false),
+      _threadEnded(false),
+      _pollingTid(0),
+      _recvBuffer(),
+      _resyncPending(false),
+      _lostCount(0),
+      _known() {}
 
 NetlinkModule::~NetlinkModule() {
   // A module deleted without Terminate must not leave its thread running on a dead object.
-  if (_threadStarted || _netlinkFd >= 0) NetlinkModule::TerminateModule();
+  if (_threadStarted || _netlinkFd >= 0 || _wakeFd >= 0) NetlinkModule::TerminateModule();
 }
 
 BaseModule* NetlinkModule::Create() { return new NetlinkModule(); }
@@ -145,7 +279,20 @@ int NetlinkModule::InitialModule() {
   // A burst of changes (a script adding many addresses, a bond re-forming) must not overflow the
   // socket: the kernel's default buffer holds a few hundred messages, and an event lost to an
   // overflow is never reported. Memory is only taken while messages wait.
+  // The knob sets it exactly (a small buffer for a box short of memory, or to try the re-reading
+  // of the state after an overflow).
   int size = kSocketBufferBytes;
+  char const* knob = std::getenv(kRecvBufferKnob);
+  if (knob != nullptr && knob[0] != '\0') {
+    char* end = nullptr;
+    const long value = std::strtol(knob, &end, 10);
+    if (*end == '\0' && value > 0 && value <= (1L << 30)) {
+      size = static_cast<int>(value);
+      VORN_LOG(LOG_INFO, "Netlink receive buffer set to [%d] bytes by %s", size, kRecvBufferKnob);
+    } else {
+      VORN_LOG(LOG_WARNING, "Ignored %s=[%s]: not a size in bytes", kRecvBufferKnob, knob);
+    }
+  }
   if (setsockopt(_netlinkFd, SOL_SOCKET, SO_RCVBUFFORCE, &size, sizeof size) != 0 &&
       setsockopt(_netlinkFd, SOL_SOCKET, SO_RCVBUF, &size, sizeof size) != 0) {
     const int err = errno;
@@ -157,11 +304,19 @@ int NetlinkModule::InitialModule() {
     VORN_LOG(LOG_ERR, "NetlinkFd::Init bind fail with err=[%d][%s]", err, std::strerror(err));
     return -1;
   }
+  if (_wakeFd < 0) _wakeFd = eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
+  if (_wakeFd < 0) {
+    const int err = errno;
+    VORN_LOG(LOG_WARNING, "No wake-up for the netlink thread with err=[%d][%s]", err,
+             std::strerror(err));
+  }
   return 0;
 }
 
 int NetlinkModule::StartModule() {
   if (_threadStarted) return 0;
+  _stopRequested = false;
+  _threadEnded = false;
   if (pthread_create(&_pollingThread, nullptr, &NetlinkModule::PollingThread, this) != 0) {
     VORN_LOG(LOG_ERR, "Failed to create netlink polling thread");
     return 0;
@@ -172,8 +327,34 @@ int NetlinkModule::StartModule() {
 
 int NetlinkModule::TerminateModule() {
   if (_threadStarted) {
-    if (pthread_cancel(_pollingThread) != 0) {
-      VORN_LOG(LOG_ERR, "Failed to cancel netlink thread");
+    // The thread looks at the flag between messages and wakes from poll by the eventfd. A hook
+    // or action it runs meanwhile gets a grace to finish; then its process group is killed,
+    // again and again, since the thread may start the next program before it sees the flag.
+    _stopRequested = true;
+    if (_wakeFd >= 0) {
+      const uint64_t one = 1;
+      if (write(_wakeFd, &one, sizeof one) < 0) {
+        // A full counter wakes the thread as well.
+      }
+    }
+    const int64_t killFrom = MonotonicMs() + kStopGraceMs;
+    const int64_t giveUp = killFrom + kStopKillPhaseMs;
+    bool killed = false;
+    while (!_threadEnded) {
+      const int64_t now = MonotonicMs();
+      if (now >= giveUp) {
+        VORN_LOG(LOG_ERR, "netlink thread did not stop within [%d] ms",
+                 kStopGraceMs + kStopKillPhaseMs);
+        break;
+      }
+      if (now >= killFrom) {
+        if (!killed) {
+          VORN_LOG(LOG_WARNING, "netlink thread still runs a program at stop: killing it");
+          killed = true;
+        }
+        KillPollingThreadChildren();
+      }
+      poll(nullptr, 0, 10);
     }
     void* result = nullptr;
     if (pthread_join(_pollingThread, &result) != 0) {
@@ -182,37 +363,60 @@ int NetlinkModule::TerminateModule() {
       VORN_LOG(LOG_ERR, "netlink thread is not cancelled");
     }
     _threadStarted = false;
+    _pollingTid = 0;
+    if (_threadEnded) LogView();  // the thread no longer touches the maps
   }
   if (_netlinkFd >= 0) {
     close(_netlinkFd);
     _netlinkFd = -1;
   }
+  if (_wakeFd >= 0) {
+    close(_wakeFd);
+    _wakeFd = -1;
+  }
   return 0;
 }
 
+void NetlinkModule::KillPollingThreadChildren() const {
+  const pid_t tid = _pollingTid;
+  if (tid <= 0) return;
+  const std::string path =
+      "/proc/" + std::to_string(getpid()) + "/task/" + std::to_string(tid) + "/children";
+  std::ifstream in(path.c_str());
+  pid_t child = 0;
+  while (in >> child) {
+    if (child <= 0) continue;
+    // Programs run in a group of their own; the whole group goes, with what it started.
+    if (getpgid(child) == child) {
+      kill(-child, SIGKILL);
+    } else {
+      kill(child, SIGKILL);
+    }
+  }
+}
+
 void* NetlinkModule::PollingThread(void* arg) {
-  // Cancellation may only end the thread inside select (StartPolling opens that window).
-  pthread_setcancelstate(PTHREAD_CANCEL_DISABLE, nullptr);
+  NetlinkModule* self = static_cast<NetlinkModule*>(arg);
+  self->_pollingTid = static_cast<pid_t>(syscall(SYS_gettid));
   long result = 0;
-  // Cancellation unwinds through here and must go on: only std::exception is caught (the
-  // unwinding is no such exception). StartPolling catches everything else itself, in the parts
-  // where cancellation is disabled.
   try {
-    result = static_cast<NetlinkModule*>(arg)->StartPolling();
+    result = self->StartPolling();
   } catch (std::exception const& e) {
     VORN_LOG(LOG_ERR, "netlink polling thread ended by [%s]", e.what());
     result = -1;
+  } catch (...) {
+    VORN_LOG(LOG_ERR, "netlink polling thread ended by an exception");
+    result = -1;
   }
-  pthread_exit(reinterpret_cast<void*>(result));
+  // A thread stopped on request ends as a cancelled one would; one that ended by itself does not.
+  void* value = self->_stopRequested ? PTHREAD_CANCELED : reinterpret_cast<void*>(result);
+  self->_threadEnded = true;
+  return value;
 }
 
 int NetlinkModule::StartPolling() {
-  UnwindGuard guard;
-  int oldState = 0;
-  pthread_setcancelstate(PTHREAD_CANCEL_DISABLE, &oldState);
-  if (_netlinkFd < 0 || _netlinkFd >= FD_SETSIZE) {
+  if (_netlinkFd < 0) {
     VORN_LOG(LOG_ERR, "Bad RTNETLINK fd [%d]", _netlinkFd);
-    pthread_setcancelstate(oldState, nullptr);
     return 0;
   }
   try {
@@ -222,55 +426,99 @@ int NetlinkModule::StartPolling() {
   } catch (...) {
     VORN_LOG(LOG_ERR, "Failed to read the interfaces");
   }
-  for (;;) {
-    fd_set readSet;
-    FD_ZERO(&readSet);
-    FD_SET(_netlinkFd, &readSet);
-    struct timeval timeout;
-    timeout.tv_sec = kPollSeconds;
-    timeout.tv_usec = 0;
-    int previous = 0;
-    pthread_setcancelstate(PTHREAD_CANCEL_ENABLE, &previous);
-    const int ready = select(_netlinkFd + 1, &readSet, nullptr, nullptr, &timeout);
-    pthread_setcancelstate(PTHREAD_CANCEL_DISABLE, nullptr);
-    if (ready < 1) continue;
-    if (FD_ISSET(_netlinkFd, &readSet)) {
+  // What the kernel holds now, so that a later loss of events is measured against it.
+  try {
+    KernelState now;
+    if (ReadKernelState(now) == 0) {
+      _known = std::move(now);
+      RebuildIndexNames();
+    }
+  } catch (...) {
+    VORN_LOG(LOG_ERR, "Failed to read the kernel's links and addresses");
+  }
+  while (!_stopRequested) {
+    struct pollfd fds[2];
+    fds[0].fd = _netlinkFd;
+    fds[0].events = POLLIN;
+    fds[0].revents = 0;
+    fds[1].fd = _wakeFd;
+    fds[1].events = POLLIN;
+    fds[1].revents = 0;
+    const int ready = poll(fds, _wakeFd >= 0 ? 2 : 1, kPollSeconds * 1000);
+    if (_stopRequested) break;
+    if (ready > 0 && fds[0].revents != 0) {
+      // Everything queued, a bounded number at a time.
+      for (int i = 0; i < kDatagramsPerWake && !_stopRequested; ++i) {
+        int result = -1;
+        try {
+          result = AnalysisNetlinkMessage();
+        } catch (std::exception const& e) {
+          VORN_LOG(LOG_ERR, "Dropped a netlink message [%s]", e.what());
+          result = 0;
+        } catch (...) {
+          VORN_LOG(LOG_ERR, "Dropped a netlink message");
+          result = 0;
+        }
+        if (_resyncPending) break;
+        if (result != 0) break;
+      }
+    }
+    if (_resyncPending && !_stopRequested) {
       try {
-        AnalysisNetlinkMessage();
-      } catch (std::exception const& e) {
-        VORN_LOG(LOG_ERR, "Dropped a netlink message [%s]", e.what());
+        ResyncKernelState();
       } catch (...) {
-        VORN_LOG(LOG_ERR, "Dropped a netlink message");
+        VORN_LOG(LOG_ERR, "Failed to read the kernel's links and addresses");
       }
     }
   }
+  return 0;
 }
 
 int NetlinkModule::AnalysisNetlinkMessage() {
-  char buffer[kRecvBufferSize];
-  std::memset(buffer, 0, sizeof buffer);
+  if (_recvBuffer.size() < kRecvBufferBytes) _recvBuffer.resize(kRecvBufferBytes);
   struct sockaddr_nl addr;
   std::memset(&addr, 0, sizeof addr);
   struct iovec iov;
-  iov.iov_base = buffer;
-  iov.iov_len = sizeof buffer;
+  iov.iov_base = _recvBuffer.data();
+  iov.iov_len = _recvBuffer.size();
   struct msghdr msg;
   std::memset(&msg, 0, sizeof msg);
   msg.msg_name = &addr;
   msg.msg_namelen = sizeof addr;
   msg.msg_iov = &iov;
   msg.msg_iovlen = 1;
-  const ssize_t received = recvmsg(_netlinkFd, &msg, 0);
+  // MSG_TRUNC: the result is the datagram's whole length even when the buffer held less.
+  const ssize_t received = recvmsg(_netlinkFd, &msg, MSG_DONTWAIT | MSG_TRUNC);
+  if (received < 0 && (errno == EAGAIN || errno == EWOULDBLOCK || errno == EINTR)) return 1;
   if (received < 1) {
+    const int err = errno;
     VORN_LOG(LOG_ERR, "recvmsg ret: [%zd] from fd [%d].", received, _netlinkFd);
+    if (received < 0 && err == ENOBUFS) {
+      // The socket overflowed: the kernel dropped messages and keeps dropping until the queue
+      // is empty.
+      ++_lostCount;
+      _resyncPending = true;
+      VORN_LOG(LOG_WARNING,
+               "Netlink events lost (ENOBUFS), reading the link and address state again");
+    }
     return -1;
   }
-  // A truncated datagram holds as many whole messages as fit in the buffer.
-  ssize_t remaining = received > static_cast<ssize_t>(sizeof buffer)
-                          ? static_cast<ssize_t>(sizeof buffer)
-                          : received;
-  char* cursor = buffer;
-  while (remaining >= static_cast<ssize_t>(sizeof(nlmsghdr))) {
+  if ((msg.msg_flags & MSG_TRUNC) != 0 || static_cast<std::size_t>(received) > _recvBuffer.size()) {
+    ++_lostCount;
+    _resyncPending = true;
+    VORN_LOG(LOG_WARNING,
+             "Netlink datagram of [%zd] bytes cut to [%zu] (MSG_TRUNC), reading the link and "
+             "address state again",
+             received, _recvBuffer.size());
+    if (static_cast<std::size_t>(received) <= kMaxRecvBufferBytes) {
+      _recvBuffer.resize(NLMSG_ALIGN(static_cast<std::size_t>(received)));
+    }
+    return 0;
+  }
+  const bool fromKernel = addr.nl_pid == 0;
+  ssize_t remaining = received;
+  char* cursor = _recvBuffer.data();
+  while (remaining >= static_cast<ssize_t>(sizeof(nlmsghdr)) && !_stopRequested) {
     nlmsghdr* header = reinterpret_cast<nlmsghdr*>(cursor);
     if (header->nlmsg_len < sizeof(nlmsghdr) ||
         static_cast<ssize_t>(header->nlmsg_len) > remaining) {
@@ -279,17 +527,22 @@ int NetlinkModule::AnalysisNetlinkMessage() {
     switch (header->nlmsg_type) {
       case RTM_NEWADDR:
       case RTM_DELADDR:
+        if (fromKernel) NoteKernelMessage(header);
         CheckIPChangeEvent(header);
         break;
       case RTM_NEWLINK:
+        if (fromKernel) NoteKernelMessage(header);
         CheckNewLinkEvent(header);
         break;
+      case RTM_DELLINK:
+        if (fromKernel) NoteKernelMessage(header);
+        break;  // not looked at otherwise
       case RTM_NEWROUTE:
       case RTM_DELROUTE:
         CheckRouteChangeEvent(header);
         break;
       default:
-        break;  // RTM_DELLINK and the rest are not looked at
+        break;
     }
     const ssize_t step = static_cast<ssize_t>(NLMSG_ALIGN(header->nlmsg_len));
     if (step >= remaining) break;
@@ -297,6 +550,230 @@ int NetlinkModule::AnalysisNetlinkMessage() {
     remaining -= step;
   }
   return 0;
+}
+
+void NetlinkModule::NoteKernelMessage(nlmsghdr const* header) {
+  switch (header->nlmsg_type) {
+    case RTM_NEWLINK:
+    case RTM_DELLINK: {
+      if (header->nlmsg_len < NLMSG_LENGTH(sizeof(ifinfomsg))) return;
+      ifinfomsg info;
+      std::memcpy(&info, NLMSG_DATA(header), sizeof info);
+      if (header->nlmsg_type == RTM_DELLINK) {
+        _known.links.erase(info.ifi_index);
+        _indexNames.erase(info.ifi_index);
+      } else {
+        std::string& stored = _known.links[info.ifi_index];
+        stored.assign(reinterpret_cast<char const*>(header), header->nlmsg_len);
+        const std::string name = StoredLinkName(stored);
+        if (name.empty()) {
+          _indexNames.erase(info.ifi_index);
+        } else {
+          _indexNames[info.ifi_index] = name;
+        }
+      }
+      return;
+    }
+    case RTM_NEWADDR:
+    case RTM_DELADDR: {
+      const std::string key = AddressKey(header);
+      if (key.empty()) return;
+      if (header->nlmsg_type == RTM_DELADDR) {
+        _known.addresses.erase(key);
+      } else {
+        _known.addresses[key].assign(reinterpret_cast<char const*>(header), header->nlmsg_len);
+      }
+      return;
+    }
+    default:
+      return;
+  }
+}
+
+std::string NetlinkModule::AddressKey(nlmsghdr const* header) {
+  if (header->nlmsg_len < NLMSG_LENGTH(sizeof(ifaddrmsg))) return "";
+  ifaddrmsg info;
+  std::memcpy(&info, NLMSG_DATA(header), sizeof info);
+  const std::size_t size = info.ifa_family == AF_INET ? 4 : info.ifa_family == AF_INET6 ? 16 : 0;
+  if (size == 0) return "";
+  char const* local = nullptr;
+  char const* address = nullptr;
+  char const* base = reinterpret_cast<char const*>(header);
+  std::size_t offset = NLMSG_LENGTH(sizeof(ifaddrmsg));
+  int remaining = static_cast<int>(header->nlmsg_len) - static_cast<int>(offset);
+  while (remaining >= static_cast<int>(sizeof(rtattr))) {
+    rtattr attr;
+    std::memcpy(&attr, base + offset, sizeof attr);
+    if (attr.rta_len < sizeof(rtattr) || static_cast<int>(attr.rta_len) > remaining) break;
+    if (RTA_PAYLOAD(&attr) >= size) {
+      if (attr.rta_type == IFA_LOCAL && local == nullptr) local = base + offset + RTA_LENGTH(0);
+      if (attr.rta_type == IFA_ADDRESS && address == nullptr) {
+        address = base + offset + RTA_LENGTH(0);
+      }
+    }
+    const int step = static_cast<int>(RTA_ALIGN(attr.rta_len));
+    remaining -= step;
+    offset += static_cast<std::size_t>(step);
+  }
+  char const* chosen = local != nullptr ? local : address;
+  if (chosen == nullptr) return "";
+  std::string key;
+  key.reserve(6 + size);
+  key.push_back(static_cast<char>(info.ifa_family));
+  key.append(reinterpret_cast<char const*>(&info.ifa_index), sizeof info.ifa_index);
+  key.append(chosen, size);
+  if (info.ifa_family == AF_INET) key.push_back(static_cast<char>(info.ifa_prefixlen));
+  return key;
+}
+
+int NetlinkModule::ReadKernelState(KernelState& state) {
+  const int fd = socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC, NETLINK_ROUTE);
+  if (fd < 0) {
+    const int err = errno;
+    VORN_LOG(LOG_ERR, "Failed to open a netlink socket with err=[%d][%s]", err,
+             std::strerror(err));
+    return -1;
+  }
+  struct timeval timeout = {kDumpTimeoutSeconds, 0};
+  setsockopt(fd, SOL_SOCKET, SO_RCVTIMEO, &timeout, sizeof timeout);
+  struct sockaddr_nl self;
+  std::memset(&self, 0, sizeof self);
+  self.nl_family = AF_NETLINK;
+  if (bind(fd, reinterpret_cast<sockaddr*>(&self), sizeof self) != 0) {
+    const int err = errno;
+    VORN_LOG(LOG_ERR, "Failed to bind a netlink socket with err=[%d][%s]", err,
+             std::strerror(err));
+    close(fd);
+    return -1;
+  }
+  std::vector<char> buffer(kRecvBufferBytes);
+  uint32_t seq = static_cast<uint32_t>(MonotonicMs());
+  int result = -1;
+  for (int attempt = 0; attempt < kDumpAttempts && result != 0; ++attempt) {
+    KernelState read;
+    std::vector<std::string> order;
+    int links = ReadDump(fd, RTM_GETLINK, ++seq, buffer, read, &order);
+    if (links < 0) break;
+    if (links > 0) continue;
+    const int addresses = ReadDump(fd, RTM_GETADDR, ++seq, buffer, read, &order);
+    if (addresses < 0) break;
+    if (addresses > 0) continue;
+    read.order = std::move(order);
+    state = std::move(read);
+    result = 0;
+  }
+  close(fd);
+  if (result != 0) VORN_LOG(LOG_ERR, "Failed to read the kernel's links and addresses");
+  return result;
+}
+
+int NetlinkModule::ResyncKernelState() {
+  // What is queued is older than the state read next: dropped unread. Its changes are part of
+  // the difference reported below. While the queue is not empty the kernel drops new messages
+  // anyway.
+  if (_recvBuffer.size() < kRecvBufferBytes) _recvBuffer.resize(kRecvBufferBytes);
+  long dropped = 0;
+  while (dropped < kMaxDroppedDatagrams && !_stopRequested && _netlinkFd >= 0) {
+    const ssize_t n = recv(_netlinkFd, _recvBuffer.data(), _recvBuffer.size(),
+                           MSG_DONTWAIT | MSG_TRUNC);
+    if (n < 0 && (errno == ENOBUFS || errno == EINTR)) continue;
+    if (n < 0) break;
+    ++dropped;
+  }
+  KernelState now;
+  if (ReadKernelState(now) != 0) return -1;
+  _resyncPending = false;
+  const int reported = ReportKernelChanges(now);
+  VORN_LOG(LOG_INFO,
+           "Netlink state read again: [%ld] queued datagrams dropped, [%d] changes reported",
+           dropped, reported);
+  LogView();
+  return 0;
+}
+
+int NetlinkModule::ReportKernelChanges(KernelState const& now) {
+  int reported = 0;
+  // Links: new ones and those whose link flags or name changed, as the kernel sent them.
+  for (auto const& link : now.links) {
+    if (_stopRequested) break;
+    auto known = _known.links.find(link.first);
+    if (known != _known.links.end() &&
+        (StoredLinkFlags(known->second) & kLinkFlagsMask) ==
+            (StoredLinkFlags(link.second) & kLinkFlagsMask) &&
+        StoredLinkName(known->second) == StoredLinkName(link.second)) {
+      continue;
+    }
+    MessageCopy copy(link.second);
+    CheckNewLinkEvent(copy.Header());
+    ++reported;
+  }
+  // Links gone while up went down before they went: the kernel said so then.
+  for (auto const& link : _known.links) {
+    if (_stopRequested) break;
+    if (now.links.count(link.first) != 0) continue;
+    if ((StoredLinkFlags(link.second) & IFF_RUNNING) == 0) continue;
+    MessageCopy copy(link.second);
+    copy.Body<ifinfomsg>()->ifi_flags &= ~(IFF_UP | IFF_RUNNING | 0x10000u);
+    CheckNewLinkEvent(copy.Header());
+    ++reported;
+  }
+  // Addresses removed, then the new ones in the kernel's order.
+  for (auto const& address : _known.addresses) {
+    if (_stopRequested) break;
+    if (now.addresses.count(address.first) != 0) continue;
+    MessageCopy copy(address.second);
+    copy.Header()->nlmsg_type = RTM_DELADDR;
+    CheckIPChangeEvent(copy.Header());
+    ++reported;
+  }
+  auto added = [&](std::string const& key) {
+    if (_stopRequested || _known.addresses.count(key) != 0) return;
+    auto it = now.addresses.find(key);
+    if (it == now.addresses.end()) return;
+    MessageCopy copy(it->second);
+    CheckIPChangeEvent(copy.Header());
+    ++reported;
+  };
+  if (now.order.size() == now.addresses.size()) {
+    for (auto const& key : now.order) added(key);
+  } else {
+    for (auto const& address : now.addresses) added(address.first);
+  }
+  KernelState next = now;
+  _known = std::move(next);
+  RebuildIndexNames();
+  return reported;
+}
+
+void NetlinkModule::RebuildIndexNames() {
+  _indexNames.clear();
+  for (auto const& link : _known.links) {
+    const std::string name = StoredLinkName(link.second);
+    if (!name.empty()) _indexNames[link.first] = name;
+  }
+}
+
+std::string NetlinkModule::NameOfIndex(int index) const {
+  // Names change only with a link message, which updates the table; an index not in it (a
+  // message handed in by hand, or the thread not running) is asked of the kernel.
+  auto it = _indexNames.find(index);
+  if (it != _indexNames.end()) return it->second;
+  return IndexToName(index);
+}
+
+void NetlinkModule::LogView() const {
+  std::set<std::string> names;
+  for (auto const& e : _linkMap.Map()) names.insert(e.first);
+  for (auto const& e : _ipv4Map.Map()) names.insert(e.first);
+  for (auto const& e : _ipv6Map) names.insert(e.first);
+  for (auto const& name : names) {
+    auto v6 = _ipv6Map.find(name);
+    const std::string ipv6 =
+        v6 == _ipv6Map.end() ? "" : vornwireless::utils::ConvertToString(v6->second, ",");
+    VORN_LOG(LOG_DEBUG, "Netlink view [%s]: link=[%s] ipv4=[%s] ipv6=[%s]", name.c_str(),
+             !_linkMap.Has(name) ? "unknown" : _linkMap.Get(name) ? "up" : "down",
+             _ipv4Map.Has(name) ? _ipv4Map.Get(name).c_str() : "", ipv6.c_str());
+  }
 }
 
 int NetlinkModule::CheckNewLinkEvent(nlmsghdr* header) {
@@ -457,7 +934,7 @@ int NetlinkModule::CheckIPChangeEvent(nlmsghdr* header) {
   if (table[IFA_LABEL] != nullptr) {
     ifname = AttrText(table[IFA_LABEL]);
   } else {
-    ifname = IndexToName(static_cast<int>(addrMsg->ifa_index));
+    ifname = NameOfIndex(static_cast<int>(addrMsg->ifa_index));
     if (ifname.empty()) {
       VORN_LOG(LOG_DEBUG, "No interface of index [%u]", addrMsg->ifa_index);
       return -1;
@@ -489,22 +966,22 @@ int NetlinkModule::ProcessIPv4Event(std::string const& ifname, std::string const
 
 int NetlinkModule::ProcessIPv6Event(std::string const& ifname, std::string const& ip,
                                     int prefixLength, bool isNew) {
-  std::map<std::string, std::vector<std::string> >::const_iterator found = _ipv6Map.find(ifname);
-  std::vector<std::string> list;
-  if (found != _ipv6Map.end()) list = found->second;
+  std::map<std::string, std::vector<std::string> >::iterator found = _ipv6Map.find(ifname);
   if (isNew) {
-    if (vornwireless::utils::Find(ip, list) >= 0) return 0;
-    const std::string joined = vornwireless::utils::ConvertToString(list, ",");
+    std::string joined;
+    if (found != _ipv6Map.end()) {
+      if (vornwireless::utils::Find(ip, found->second) >= 0) return 0;
+      joined = vornwireless::utils::ConvertToString(found->second, ",");
+    }
     vornwireless::hook::NetIPChangeEvent(vornwireless::hook::IPTYPE_IPV6, ifname, joined, ip,
                                          prefixLength);
-    list.push_back(ip);
-    _ipv6Map[ifname] = list;
+    _ipv6Map[ifname].push_back(ip);
     return 0;
   }
-  const int index = vornwireless::utils::Find(ip, list);
+  if (found == _ipv6Map.end()) return 0;
+  const int index = vornwireless::utils::Find(ip, found->second);
   if (index < 0) return 0;
-  list.erase(list.begin() + index);
-  _ipv6Map[ifname] = list;
+  found->second.erase(found->second.begin() + index);
   return 0;
 }
 
@@ -531,7 +1008,7 @@ int NetlinkModule::CheckRouteChangeEvent(nlmsghdr* header) {
     if (attr->rta_type == RTA_OIF && payload >= sizeof(int)) {
       int index = 0;
       std::memcpy(&index, RTA_DATA(attr), sizeof index);
-      ifname = IndexToName(index);
+      ifname = NameOfIndex(index);
     } else if ((attr->rta_type == RTA_DST || attr->rta_type == RTA_GATEWAY) && payload >= 4) {
       char text[32] = "";
       if (inet_ntop(AF_INET, RTA_DATA(attr), text, sizeof text) != nullptr) {

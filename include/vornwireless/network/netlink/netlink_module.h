@@ -2,14 +2,25 @@
 // address and main-table route messages into the platform's link events, the IP change hook and
 // the gateway change hook. Repeats of a state, bond slaves, "tap"/"docker" interfaces and the
 // passing state "running without lower-up" are not reported.
+//
+// Nothing is missed silently: a datagram cut short (MSG_TRUNC) or events lost to a full socket
+// (ENOBUFS) make the watcher read the kernel's whole link and address state again and report what
+// changed since the state it knew last, each change as the message that would have told it.
+// Tuning knob: the environment variable VORN_NETLINK_RCVBUF (bytes) sets the socket's receive
+// buffer instead of the default 4 MiB (a small value makes overflows, and so the re-reading,
+// happen; the kernel doubles the value and keeps a floor of its own).
 #ifndef VORNWIRELESS_NETWORK_NETLINK_NETLINK_MODULE_H
 #define VORNWIRELESS_NETWORK_NETLINK_NETLINK_MODULE_H
 
 #include <linux/netlink.h>
 #include <pthread.h>
 
+#include <sys/types.h>
+
+#include <atomic>
 #include <map>
 #include <string>
+#include <unordered_map>
 #include <vector>
 
 #include "vornwireless/network/base_module.h"
@@ -52,6 +63,19 @@ class NetlinkModule : public BaseModule {
  public:
   // Link, IPv4 address, IPv4 route and IPv6 address groups (IPv6 routes are not watched).
   static const unsigned int kNetlinkGroups = 0x151;
+  // The receive buffer a datagram is read into at first; a datagram cut short grows it.
+  static const std::size_t kRecvBufferBytes = 64 * 1024;
+  // How long TerminateModule lets a running hook or action finish before its process group is
+  // killed.
+  static const int kStopGraceMs = 1000;
+
+  // What the watcher knows of the kernel: every link and address, each as the last message that
+  // told it (the kernel's own bytes).
+  struct KernelState {
+    std::map<int, std::string> links;                      // by interface index
+    std::unordered_map<std::string, std::string> addresses;  // by AddressKey
+    std::vector<std::string> order;  // keys of addresses in the kernel's order (when read whole)
+  };
 
   NetlinkModule();
   ~NetlinkModule() override;
@@ -66,11 +90,35 @@ class NetlinkModule : public BaseModule {
   int TerminateModule() override;
   // Starts the polling thread; a thread that cannot be created is logged and still gives 0.
   int StartModule() override;
-  // The polling thread's body: fills the maps, then waits for messages for ever.
+  // The polling thread's body: fills the maps, then waits for messages until TerminateModule.
   virtual int StartPolling();
 
-  // One datagram from the socket, dispatched message by message. 0; -1 when recvmsg failed.
+  // One datagram from the socket (without waiting), dispatched message by message. 0; 1 when
+  // nothing was queued; -1 when recvmsg failed (logged). A datagram cut short is not looked at
+  // and, like a failure with ENOBUFS, marks the state to be read again (ResyncPending()).
   int AnalysisNetlinkMessage();
+  // Whether events were lost since the state was last read whole.
+  bool ResyncPending() const { return _resyncPending; }
+  // Drops what is queued on the socket (older than what is read next), reads the kernel's links
+  // and addresses on a socket of its own and reports the differences (ReportKernelChanges).
+  // 0; -1 when the state could not be read (it stays pending).
+  int ResyncKernelState();
+  // Reports every difference between the known state and `now` as the message that would have
+  // told it: links that are new or whose link flags changed, links gone while up (as going
+  // down), then removed addresses, then new ones, each through the Check* operations. Then `now`
+  // is the known state. The number of messages reported.
+  int ReportKernelChanges(KernelState const& now);
+  // Reads the kernel's links and addresses with two dumps on a socket of its own. 0; -1.
+  static int ReadKernelState(KernelState& state);
+  // Records a kernel message (link or address) in the known state.
+  void NoteKernelMessage(nlmsghdr const* header);
+  // The key of an address message: family, interface index, address and (IPv4) prefix length;
+  // empty when it has no address.
+  static std::string AddressKey(nlmsghdr const* header);
+  KernelState const& GetKnownState() const { return _known; }
+  // How many times events were lost (ENOBUFS or a cut datagram) and the state read again.
+  long GetLostCount() const { return _lostCount; }
+
   // The checks of one message; -1 when the message is not looked at.
   int CheckNewLinkEvent(nlmsghdr* header);
   int CheckIPChangeEvent(nlmsghdr* header);
@@ -102,12 +150,30 @@ class NetlinkModule : public BaseModule {
   int GetOVSMasterStatus(std::string const& slave, bool slaveUp, std::string& master,
                          bool& masterUp);
 
+  // Logs the maps, one line per interface, at LOG_DEBUG ("Netlink view [...]"): after the state
+  // was read again and when the module stops.
+  void LogView() const;
+  // The name of an interface index: from the links the kernel reported, else if_indextoname.
+  std::string NameOfIndex(int index) const;
+  void RebuildIndexNames();
+  // Kills the process groups of the children the polling thread waits for (a hook, an action).
+  void KillPollingThreadChildren() const;
+
   int _netlinkFd;
   pthread_t _pollingThread;
   IFMap<std::string> _ipv4Map;
   std::map<std::string, std::vector<std::string> > _ipv6Map;
   IFMap<bool> _linkMap;
   bool _threadStarted;  // _pollingThread holds a thread that was not joined yet
+  int _wakeFd;          // eventfd that wakes the polling thread for a stop
+  std::atomic<bool> _stopRequested;
+  std::atomic<bool> _threadEnded;
+  std::atomic<pid_t> _pollingTid;
+  std::vector<char> _recvBuffer;
+  bool _resyncPending;
+  long _lostCount;
+  KernelState _known;
+  std::unordered_map<int, std::string> _indexNames;  // from _known.links
 };
 
 }  // namespace module
