@@ -3,6 +3,7 @@
 #include "vornwireless/network/netlink/netlink_module.h"
 
 #include <arpa/inet.h>
+#include <dirent.h>
 #include <linux/rtnetlink.h>
 #include <net/if.h>
 #include <poll.h>
@@ -377,21 +378,47 @@ int NetlinkModule::TerminateModule() {
   return 0;
 }
 
+namespace {
+
+// The children of every thread of process pid.
+std::vector<pid_t> ChildrenOf(pid_t pid, pid_t onlyTask) {
+  std::vector<pid_t> out;
+  std::vector<std::string> tasks;
+  if (onlyTask > 0) {
+    tasks.push_back(std::to_string(onlyTask));
+  } else {
+    const std::string dir = "/proc/" + std::to_string(pid) + "/task";
+    DIR* d = opendir(dir.c_str());
+    if (d == nullptr) return out;
+    while (struct dirent* e = readdir(d)) {
+      if (e->d_name[0] != '.') tasks.push_back(e->d_name);
+    }
+    closedir(d);
+  }
+  for (auto const& task : tasks) {
+    std::ifstream in(("/proc/" + std::to_string(pid) + "/task/" + task + "/children").c_str());
+    pid_t child = 0;
+    while (in >> child) {
+      if (child > 0) out.push_back(child);
+    }
+  }
+  return out;
+}
+
+}  // namespace
+
 void NetlinkModule::KillPollingThreadChildren() const {
   const pid_t tid = _pollingTid;
   if (tid <= 0) return;
-  const std::string path =
-      "/proc/" + std::to_string(getpid()) + "/task/" + std::to_string(tid) + "/children";
-  std::ifstream in(path.c_str());
-  pid_t child = 0;
-  while (in >> child) {
-    if (child <= 0) continue;
-    // Programs run in a group of their own; the whole group goes, with what it started.
-    if (getpgid(child) == child) {
-      kill(-child, SIGKILL);
-    } else {
-      kill(child, SIGKILL);
-    }
+  // The programs the thread waits for and everything they started (a program runs in a group of
+  // its own, which goes as a whole too).
+  std::vector<pid_t> tree = ChildrenOf(getpid(), tid);
+  for (std::size_t i = 0; i < tree.size() && tree.size() < 4096; ++i) {
+    for (pid_t grandchild : ChildrenOf(tree[i], 0)) tree.push_back(grandchild);
+  }
+  for (pid_t pid : tree) {
+    if (getpgid(pid) == pid) kill(-pid, SIGKILL);
+    kill(pid, SIGKILL);
   }
 }
 
@@ -432,6 +459,7 @@ int NetlinkModule::StartPolling() {
     if (ReadKernelState(now) == 0) {
       _known = std::move(now);
       RebuildIndexNames();
+      _resyncPending = false;
     }
   } catch (...) {
     VORN_LOG(LOG_ERR, "Failed to read the kernel's links and addresses");
@@ -684,6 +712,8 @@ int NetlinkModule::ResyncKernelState() {
   if (ReadKernelState(now) != 0) return -1;
   _resyncPending = false;
   const int reported = ReportKernelChanges(now);
+  // A stop in the middle left changes unreported: a module started again reads the state anew.
+  if (_stopRequested) _resyncPending = true;
   VORN_LOG(LOG_INFO,
            "Netlink state read again: [%ld] queued datagrams dropped, [%d] changes reported",
            dropped, reported);
