@@ -145,6 +145,26 @@ std::string StoredLinkName(std::string const& bytes) {
   return "";
 }
 
+// The gateway and output interface of a stored route message, as bytes.
+std::string RouteWay(std::string const& bytes) {
+  std::string way;
+  int remaining = static_cast<int>(bytes.size()) - static_cast<int>(NLMSG_LENGTH(sizeof(rtmsg)));
+  std::size_t offset = NLMSG_LENGTH(sizeof(rtmsg));
+  while (remaining >= static_cast<int>(sizeof(rtattr))) {
+    rtattr attr;
+    std::memcpy(&attr, bytes.data() + offset, sizeof attr);
+    if (attr.rta_len < sizeof(rtattr) || static_cast<int>(attr.rta_len) > remaining) break;
+    if (attr.rta_type == RTA_GATEWAY || attr.rta_type == RTA_OIF || attr.rta_type == RTA_MULTIPATH) {
+      way.push_back(static_cast<char>(attr.rta_type));
+      way.append(bytes.data() + offset + RTA_LENGTH(0), attr.rta_len - RTA_LENGTH(0));
+    }
+    const int step = static_cast<int>(RTA_ALIGN(attr.rta_len));
+    remaining -= step;
+    offset += static_cast<std::size_t>(step);
+  }
+  return way;
+}
+
 // An aligned, writable copy of a stored message, to hand to a Check* operation.
 class MessageCopy {
  public:
@@ -159,8 +179,9 @@ class MessageCopy {
   std::vector<uint64_t> _words;
 };
 
-// Sends one dump request and collects its answers of type `want`: links by index, addresses by
-// key (with their order). 0; 1 when the dump was interrupted by changes; -1 on failure.
+// Sends one dump request and collects its answers: links by index, addresses by key (with their
+// order), main-table IPv4 routes by key. 0; 1 when the dump was interrupted by changes or cut
+// (read again); -1 on failure.
 int ReadDump(int fd, uint16_t type, uint32_t seq, std::vector<char>& buffer,
              NetlinkModule::KernelState& state, std::vector<std::string>* order) {
   struct {
@@ -168,12 +189,14 @@ int ReadDump(int fd, uint16_t type, uint32_t seq, std::vector<char>& buffer,
     ifinfomsg body;  // an ifaddrmsg request uses its first 8 bytes
   } request;
   std::memset(&request, 0, sizeof request);
-  request.header.nlmsg_len = type == RTM_GETLINK ? NLMSG_LENGTH(sizeof(ifinfomsg))
-                                                 : NLMSG_LENGTH(sizeof(ifaddrmsg));
+  request.header.nlmsg_len = type == RTM_GETLINK   ? NLMSG_LENGTH(sizeof(ifinfomsg))
+                             : type == RTM_GETADDR ? NLMSG_LENGTH(sizeof(ifaddrmsg))
+                                                   : NLMSG_LENGTH(sizeof(rtmsg));
   request.header.nlmsg_type = type;
   request.header.nlmsg_flags = NLM_F_REQUEST | NLM_F_DUMP;
   request.header.nlmsg_seq = seq;
-  request.body.ifi_family = AF_UNSPEC;
+  // The family is the first byte of each body; routes are watched for IPv4 only.
+  request.body.ifi_family = type == RTM_GETROUTE ? AF_INET : AF_UNSPEC;
   struct sockaddr_nl kernel;
   std::memset(&kernel, 0, sizeof kernel);
   kernel.nl_family = AF_NETLINK;
@@ -184,7 +207,9 @@ int ReadDump(int fd, uint16_t type, uint32_t seq, std::vector<char>& buffer,
              std::strerror(err));
     return -1;
   }
-  const uint16_t answer = type == RTM_GETLINK ? RTM_NEWLINK : RTM_NEWADDR;
+  const uint16_t answer = type == RTM_GETLINK   ? RTM_NEWLINK
+                          : type == RTM_GETADDR ? RTM_NEWADDR
+                                                : RTM_NEWROUTE;
   bool interrupted = false;
   for (;;) {
     struct sockaddr_nl from;
@@ -224,6 +249,9 @@ int ReadDump(int fd, uint16_t type, uint32_t seq, std::vector<char>& buffer,
       if (answer == RTM_NEWLINK) {
         if (h->nlmsg_len < NLMSG_LENGTH(sizeof(ifinfomsg))) continue;
         state.links[static_cast<ifinfomsg*>(NLMSG_DATA(h))->ifi_index] = bytes;
+      } else if (answer == RTM_NEWROUTE) {
+        const std::string key = NetlinkModule::RouteKey(h);
+        if (!key.empty()) state.routes[key] = bytes;
       } else {
         const std::string key = NetlinkModule::AddressKey(h);
         if (key.empty()) continue;
@@ -567,6 +595,7 @@ int NetlinkModule::AnalysisNetlinkMessage() {
         break;  // not looked at otherwise
       case RTM_NEWROUTE:
       case RTM_DELROUTE:
+        if (fromKernel) NoteKernelMessage(header);
         CheckRouteChangeEvent(header);
         break;
       default:
@@ -613,9 +642,52 @@ void NetlinkModule::NoteKernelMessage(nlmsghdr const* header) {
       }
       return;
     }
+    case RTM_NEWROUTE:
+    case RTM_DELROUTE: {
+      const std::string key = RouteKey(header);
+      if (key.empty()) return;
+      if (header->nlmsg_type == RTM_DELROUTE) {
+        _known.routes.erase(key);
+      } else {
+        _known.routes[key].assign(reinterpret_cast<char const*>(header), header->nlmsg_len);
+      }
+      return;
+    }
     default:
       return;
   }
+}
+
+std::string NetlinkModule::RouteKey(nlmsghdr const* header) {
+  if (header->nlmsg_len < NLMSG_LENGTH(sizeof(rtmsg))) return "";
+  rtmsg info;
+  std::memcpy(&info, NLMSG_DATA(header), sizeof info);
+  if (info.rtm_family != AF_INET || info.rtm_table != RT_TABLE_MAIN) return "";
+  uint32_t dst = 0;
+  uint32_t priority = 0;
+  char const* base = reinterpret_cast<char const*>(header);
+  std::size_t offset = NLMSG_LENGTH(sizeof(rtmsg));
+  int remaining = static_cast<int>(header->nlmsg_len) - static_cast<int>(offset);
+  while (remaining >= static_cast<int>(sizeof(rtattr))) {
+    rtattr attr;
+    std::memcpy(&attr, base + offset, sizeof attr);
+    if (attr.rta_len < sizeof(rtattr) || static_cast<int>(attr.rta_len) > remaining) break;
+    if (RTA_PAYLOAD(&attr) >= 4) {
+      if (attr.rta_type == RTA_DST) std::memcpy(&dst, base + offset + RTA_LENGTH(0), 4);
+      if (attr.rta_type == RTA_PRIORITY) std::memcpy(&priority, base + offset + RTA_LENGTH(0), 4);
+    }
+    const int step = static_cast<int>(RTA_ALIGN(attr.rta_len));
+    remaining -= step;
+    offset += static_cast<std::size_t>(step);
+  }
+  // What tells routes of the main table apart: destination, length, TOS, metric, type.
+  std::string key;
+  key.push_back(static_cast<char>(info.rtm_dst_len));
+  key.push_back(static_cast<char>(info.rtm_tos));
+  key.push_back(static_cast<char>(info.rtm_type));
+  key.append(reinterpret_cast<char const*>(&dst), sizeof dst);
+  key.append(reinterpret_cast<char const*>(&priority), sizeof priority);
+  return key;
 }
 
 std::string NetlinkModule::AddressKey(nlmsghdr const* header) {
@@ -686,6 +758,9 @@ int NetlinkModule::ReadKernelState(KernelState& state) {
     const int addresses = ReadDump(fd, RTM_GETADDR, ++seq, buffer, read, &order);
     if (addresses < 0) break;
     if (addresses > 0) continue;
+    const int routes = ReadDump(fd, RTM_GETROUTE, ++seq, buffer, read, nullptr);
+    if (routes < 0) break;
+    if (routes > 0) continue;
     read.order = std::move(order);
     state = std::move(read);
     result = 0;
@@ -768,6 +843,23 @@ int NetlinkModule::ReportKernelChanges(KernelState const& now) {
     for (auto const& key : now.order) added(key);
   } else {
     for (auto const& address : now.addresses) added(address.first);
+  }
+  // Main-table routes removed, then those that are new or go another way.
+  for (auto const& route : _known.routes) {
+    if (_stopRequested) break;
+    if (now.routes.count(route.first) != 0) continue;
+    MessageCopy copy(route.second);
+    copy.Header()->nlmsg_type = RTM_DELROUTE;
+    CheckRouteChangeEvent(copy.Header());
+    ++reported;
+  }
+  for (auto const& route : now.routes) {
+    if (_stopRequested) break;
+    auto known = _known.routes.find(route.first);
+    if (known != _known.routes.end() && RouteWay(known->second) == RouteWay(route.second)) continue;
+    MessageCopy copy(route.second);
+    CheckRouteChangeEvent(copy.Header());
+    ++reported;
   }
   KernelState next = now;
   _known = std::move(next);

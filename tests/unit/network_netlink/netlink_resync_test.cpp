@@ -27,6 +27,7 @@ using vorntest::AddrMessage;
 using vorntest::HookRun;
 using vorntest::LinkMessage;
 using vorntest::LogLine;
+using vorntest::RouteMessage;
 
 namespace {
 
@@ -94,6 +95,7 @@ class NetlinkResyncTest : public ::testing::Test {
     vorntest::ClearLinkEvents();
     ASSERT_TRUE(vorntest::InstallRecordingHook("net/ipv4_change", "10-record"));
     ASSERT_TRUE(vorntest::InstallRecordingHook("net/ipv6_change", "10-record"));
+    ASSERT_TRUE(vorntest::InstallRecordingHook("net/gateway_change", "10-record"));
     ASSERT_TRUE(vorntest::InstallLinkRecorders());
     eth0 = static_cast<int>(if_nametoindex("eth0"));
     ASSERT_GT(eth0, 0);
@@ -152,6 +154,18 @@ TEST_F(NetlinkResyncTest, OnlyRealChangesAreReportedAsTheirMessagesWouldBe) {
     before.addresses[key(*m)] = *m;
     before.order.push_back(key(*m));
   }
+  auto routeKey = [](std::string const& m) {
+    return NetlinkModule::RouteKey(reinterpret_cast<nlmsghdr const*>(m.data()));
+  };
+  const std::string r5 = RouteMessage(RTM_NEWROUTE, 254, "eth0", "10.5.0.0", 16, "10.200.1.1").Bytes();
+  const std::string r6 = RouteMessage(RTM_NEWROUTE, 254, "eth0", "10.6.0.0", 16, "10.200.1.1").Bytes();
+  const std::string r6b = RouteMessage(RTM_NEWROUTE, 254, "eth0", "10.6.0.0", 16, "10.200.1.7").Bytes();
+  const std::string r7 = RouteMessage(RTM_NEWROUTE, 254, "eth0", "10.7.0.0", 16, "").Bytes();
+  const std::string r8 = RouteMessage(RTM_NEWROUTE, 254, "eth0", "10.8.0.0", 16, "").Bytes();
+  EXPECT_TRUE(NetlinkModule::RouteKey(reinterpret_cast<nlmsghdr const*>(
+                  RouteMessage(RTM_NEWROUTE, 100, "eth0", "10.8.0.0", 16, "").Bytes().data()))
+                  .empty());  // other tables are not watched
+  for (auto const* m : {&r5, &r6, &r8}) before.routes[routeKey(*m)] = *m;
   module.ReportKernelChanges(before);
   EXPECT_EQ(module.GetIPv6Map().at("eth0"), (std::vector<std::string>{"fd00:1::a", "fd00:1::b"}));
   vorntest::ClearHookRuns();
@@ -165,8 +179,12 @@ TEST_F(NetlinkResyncTest, OnlyRealChangesAreReportedAsTheirMessagesWouldBe) {
     after.addresses[key(*m)] = *m;
     after.order.push_back(key(*m));
   }
-  // eth0's link, gone0 down, fd00:1::a and 10.1.0.1 removed, fd00:1::c and 10.1.0.2 added.
-  EXPECT_EQ(module.ReportKernelChanges(after), 6);
+  // 10.5.0.0/16 went, 10.6.0.0/16 goes through another gateway, 10.7.0.0/16 came, 10.8.0.0/16
+  // stayed.
+  for (auto const* m : {&r6b, &r7, &r8}) after.routes[routeKey(*m)] = *m;
+  // eth0's link, gone0 down, fd00:1::a and 10.1.0.1 removed, fd00:1::c and 10.1.0.2 added, three
+  // routes.
+  EXPECT_EQ(module.ReportKernelChanges(after), 9);
   EXPECT_EQ(vorntest::LinkEvents(),
             (std::vector<std::string>{"down eth0 flag=1", "down gone0 flag=1"}));
   // An IPv6 removal runs no hook; the new one sees the list without the removed address.
@@ -184,6 +202,18 @@ TEST_F(NetlinkResyncTest, OnlyRealChangesAreReportedAsTheirMessagesWouldBe) {
   EXPECT_EQ(v4[0].env["NEW_ADDRESS"], "10.1.0.2");
   EXPECT_EQ(module.GetIPv4Map().Get("eth0"), "10.1.0.2");
   EXPECT_FALSE(module.GetLinkMap().Get("gone0"));
+  auto routes = Runs("net/gateway_change");
+  ASSERT_EQ(routes.size(), 3u);
+  EXPECT_EQ(routes[0].env["ACTION"], "DEL");
+  EXPECT_EQ(routes[0].env["DESTINATION"], "10.5.0.0");
+  EXPECT_EQ(routes[0].env["GATEWAY"], "10.200.1.1");
+  EXPECT_EQ(routes[1].env["ACTION"], "NEW");
+  EXPECT_EQ(routes[1].env["DESTINATION"], "10.6.0.0");
+  EXPECT_EQ(routes[1].env["GATEWAY"], "10.200.1.7");
+  EXPECT_EQ(routes[2].env["ACTION"], "NEW");
+  EXPECT_EQ(routes[2].env["DESTINATION"], "10.7.0.0");
+  EXPECT_EQ(routes[2].env["GATEWAY"], "0.0.0.0");
+  EXPECT_EQ(routes[2].env["IFNAME"], "eth0");
 
   // The state reported is the one known now.
   vorntest::ClearHookRuns();
@@ -261,6 +291,7 @@ TEST_F(NetlinkResyncTest, OverflowIsDetectedAndTheStateReadAgainEqualsTheKernels
   for (int i = 1; i <= 60; ++i) {
     add += "address add 2001:db8:7::" + std::to_string(i) + "/128 dev eth0 nodad\n";
     add += "address add 10.7.0." + std::to_string(i) + "/32 dev eth0\n";
+    if (i <= 20) add += "route add 10.8." + std::to_string(i) + ".0/24 dev eth0\n";
   }
   IpBatch(add);
   // Read until the overflow shows (the kernel keeps a few messages and drops the rest).
@@ -294,6 +325,14 @@ TEST_F(NetlinkResyncTest, OverflowIsDetectedAndTheStateReadAgainEqualsTheKernels
   }
   EXPECT_EQ(KernelAddresses("-4", "eth0").count(module.GetIPv4Map().Get("eth0")), 1u)
       << module.GetIPv4Map().Get("eth0");
+  // Each new main-table route reported once too.
+  std::multiset<std::string> routes;
+  for (auto& r : Runs("net/gateway_change")) {
+    if (r.env["ACTION"] == "NEW") routes.insert(r.env["DESTINATION"]);
+  }
+  for (int i = 1; i <= 20; ++i) {
+    EXPECT_EQ(routes.count("10.8." + std::to_string(i) + ".0"), 1u) << i;
+  }
 
   // Removals lost the same way leave the view equal to the kernel's again.
   std::string del;
@@ -310,6 +349,7 @@ TEST_F(NetlinkResyncTest, OverflowIsDetectedAndTheStateReadAgainEqualsTheKernels
   EXPECT_EQ(module.GetLostCount(), 2);
 
   std::string cleanup;
+  for (int i = 1; i <= 20; ++i) cleanup += "route del 10.8." + std::to_string(i) + ".0/24 dev eth0\n";
   for (int i = 1; i <= 60; ++i) {
     cleanup += "address del 10.7.0." + std::to_string(i) + "/32 dev eth0\n";
     if (i > 50) cleanup += "address del 2001:db8:7::" + std::to_string(i) + "/128 dev eth0\n";

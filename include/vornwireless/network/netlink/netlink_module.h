@@ -4,8 +4,9 @@
 // passing state "running without lower-up" are not reported.
 //
 // Nothing is missed silently: a datagram cut short (MSG_TRUNC) or events lost to a full socket
-// (ENOBUFS) make the watcher read the kernel's whole link and address state again and report what
-// changed since the state it knew last, each change as the message that would have told it.
+// (ENOBUFS) make the watcher read the kernel's whole link, address and route state again and
+// report what changed since the state it knew last, each change as the message that would have
+// told it.
 // Tuning knob: the environment variable VORN_NETLINK_RCVBUF (bytes) sets the socket's receive
 // buffer instead of the default 4 MiB (a small value makes overflows, and so the re-reading,
 // happen; the kernel doubles the value and keeps a floor of its own).
@@ -69,12 +70,13 @@ class NetlinkModule : public BaseModule {
   // killed.
   static const int kStopGraceMs = 1000;
 
-  // What the watcher knows of the kernel: every link and address, each as the last message that
-  // told it (the kernel's own bytes).
+  // What the watcher knows of the kernel: every link, address and main-table IPv4 route, each as
+  // the last message that told it (the kernel's own bytes).
   struct KernelState {
     std::map<int, std::string> links;                      // by interface index
     std::unordered_map<std::string, std::string> addresses;  // by AddressKey
     std::vector<std::string> order;  // keys of addresses in the kernel's order (when read whole)
+    std::map<std::string, std::string> routes;  // main-table IPv4 routes, by RouteKey
   };
 
   NetlinkModule();
@@ -99,22 +101,27 @@ class NetlinkModule : public BaseModule {
   int AnalysisNetlinkMessage();
   // Whether events were lost since the state was last read whole.
   bool ResyncPending() const { return _resyncPending; }
-  // Drops what is queued on the socket (older than what is read next), reads the kernel's links
-  // and addresses on a socket of its own and reports the differences (ReportKernelChanges).
+  // Drops what is queued on the socket (older than what is read next), reads the kernel's links,
+  // addresses and routes on a socket of its own and reports the differences (ReportKernelChanges).
   // 0; -1 when the state could not be read (it stays pending).
   int ResyncKernelState();
   // Reports every difference between the known state and `now` as the message that would have
   // told it: links that are new or whose link flags changed, links gone while up (as going
-  // down), then removed addresses, then new ones, each through the Check* operations. Then `now`
-  // is the known state. The number of messages reported.
+  // down), then removed addresses, new ones, removed main-table routes, and routes new or going
+  // another way, each through the Check* operations. Then `now` is the known state. The number
+  // of messages reported.
   int ReportKernelChanges(KernelState const& now);
-  // Reads the kernel's links and addresses with two dumps on a socket of its own. 0; -1.
+  // Reads the kernel's links, addresses and main-table IPv4 routes with three dumps on a socket
+  // of its own. 0; -1.
   static int ReadKernelState(KernelState& state);
   // Records a kernel message (link or address) in the known state.
   void NoteKernelMessage(nlmsghdr const* header);
   // The key of an address message: family, interface index, address and (IPv4) prefix length;
   // empty when it has no address.
   static std::string AddressKey(nlmsghdr const* header);
+  // The key of a main-table IPv4 route message (destination, length, TOS, type, metric); empty
+  // for any other route.
+  static std::string RouteKey(nlmsghdr const* header);
   KernelState const& GetKnownState() const { return _known; }
   // How many times events were lost (ENOBUFS or a cut datagram) and the state read again.
   long GetLostCount() const { return _lostCount; }
