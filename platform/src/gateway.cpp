@@ -85,7 +85,10 @@ class NetlinkSocket {
       }
       if (n == 0 || (mh.msg_flags & MSG_TRUNC)) return -EIO;
       int len = static_cast<int>(n);
-      for (struct nlmsghdr* h = reinterpret_cast<struct nlmsghdr*>(buf.data()); NLMSG_OK(h, len);
+      // NLMSG_OK spelled out: the macro compares the unsigned length with the signed rest.
+      for (struct nlmsghdr* h = reinterpret_cast<struct nlmsghdr*>(buf.data());
+           len >= static_cast<int>(sizeof(struct nlmsghdr)) &&
+           h->nlmsg_len >= sizeof(struct nlmsghdr) && h->nlmsg_len <= static_cast<unsigned>(len);
            h = NLMSG_NEXT(h, len)) {
         if (h->nlmsg_seq != seq_) continue;
         if (h->nlmsg_type == NLMSG_DONE) return 0;
