@@ -174,8 +174,6 @@ int MakeDirs(const std::string& path, mode_t mode) {
 
 namespace {
 
-constexpr const char* kSectionDefaultFmt = "\t%s=%s\n";
-
 int ErrCodeOf(int e) {
   switch (e) {
     case ENOENT:
@@ -246,7 +244,8 @@ bool ParseSectionHeader(const std::string& line, std::string* name) {
 }
 
 // "key<sep>value" with optional leading blanks. Comments, section headers, lines without the
-// separator, empty keys and over-long keys or values are not key lines.
+// separator, empty keys, keys holding a NUL byte (no caller can name them, and a hash refuses
+// them) and over-long keys or values are not key lines.
 bool ParseKeyLine(const std::string& line, char sep, KeyLine* out) {
   std::size_t i = 0;
   while (i < line.size() && IsBlank(line[i])) ++i;
@@ -254,7 +253,9 @@ bool ParseKeyLine(const std::string& line, char sep, KeyLine* out) {
   const std::size_t pos = line.find(sep, i);
   if (pos == std::string::npos) return false;
   std::string key = Trim(line.substr(i, pos - i));
-  if (key.empty() || key.size() > VLIBC_KEY_MAX) return false;
+  if (key.empty() || key.size() > VLIBC_KEY_MAX || key.find('\0') != std::string::npos) {
+    return false;
+  }
   std::string value = Trim(line.substr(pos + 1));
   bool quoted = false;
   if (value.size() >= 2 && value.front() == '"' && value.back() == '"') {
