@@ -1,6 +1,9 @@
 #include "vornwireless/usbmodem_lib/usbmodem_atif_zoom.h"
 
+#include <climits>
 #include <cstdlib>
+
+#include "vornplatform/log.h"
 
 namespace vornwireless {
 namespace usbmodem_lib {
@@ -24,7 +27,13 @@ std::string USBModem_ATIF_Zoom::GetATCommandPUKAttempt() { return "AT*EPINR=3"; 
 int USBModem_ATIF_Zoom::ParseRetStringGetSignalLevel(std::string const& reply, int& level) {
   std::string field;
   if (GetLineWithDelim(reply, ',', 2, field) != 0) return -1;
-  level = atoi(field.c_str()) * 20;
+  const int value = atoi(field.c_str());
+  // A value whose level would not fit an int is no signal reading.
+  if (value > INT_MAX / 20 || value < INT_MIN / 20) {
+    VORN_LOG(LOG_ERR, "invalid signal value %d in input string: (%s)", value, reply.c_str());
+    return -1;
+  }
+  level = value * 20;
   return 0;
 }
 
