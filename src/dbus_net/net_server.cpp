@@ -36,9 +36,11 @@ bool CheckParameter(NetObject const* object, const char* text, GError** error) {
 }
 
 // Parses the JSON text of a request, comments allowed. A failure logs `what` and sets no error.
+// The comments are not kept with the values: a reply built from request values would carry them
+// back as they were written, an unterminated "/*" included, and would not parse.
 bool Parse(const char* text, Json::Value& request, const char* what) {
   Json::Reader reader;
-  if (!reader.parse(text, request, true)) {
+  if (!reader.parse(text, request, false)) {
     VORN_LOG(LOG_ERR, "%s", what);
     return false;
   }
