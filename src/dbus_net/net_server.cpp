@@ -38,9 +38,17 @@ bool CheckParameter(NetObject const* object, const char* text, GError** error) {
 // Parses the JSON text of a request, comments allowed. A failure logs `what` and sets no error.
 // The comments are not kept with the values: a reply built from request values would carry them
 // back as they were written, an unterminated "/*" included, and would not parse.
+// Text nested deeper than the reader's stack limit makes jsoncpp throw instead of failing: that
+// is text we cannot parse, like any other.
 bool Parse(const char* text, Json::Value& request, const char* what) {
-  Json::Reader reader;
-  if (!reader.parse(text, request, false)) {
+  bool parsed = false;
+  try {
+    Json::Reader reader;
+    parsed = reader.parse(text, request, false);
+  } catch (std::exception const& e) {
+    VORN_LOG(LOG_ERR, "Unparsable request: %s", e.what());
+  }
+  if (!parsed) {
     VORN_LOG(LOG_ERR, "%s", what);
     return false;
   }

@@ -141,6 +141,34 @@ TEST(FuzzRegressionNetMethods, CommentsOfARequestDoNotReachTheReply) {
   EXPECT_EQ(reply["request"]["method"].asString(), "GET_GATEWAY_DATA_BY_INTERFACE");
 }
 
+// Arrays nested deeper than jsoncpp's stack limit made the reader throw out of the handler and
+// end the daemon; such text is now refused like any text that is not JSON.
+TEST(FuzzRegressionNetMethods, TextNestedDeeperThanTheParserLimitIsNotJson) {
+  const std::string input = Kept("net/nested-deeper-than-the-parser-limit");
+  ASSERT_GE(input.size(), 1001u);
+  for (int m = 0; m < vornfuzz::kNetMethodCount; ++m) {
+    vornfuzz::NetAnswer a = vornfuzz::CallNetMethod(m, input);
+    vornfuzz::CheckNetAnswer(m, input, a);
+    if (vornfuzz::NetMethodAt(m).jsonArgument) {
+      EXPECT_FALSE(a.ok) << m;
+      EXPECT_FALSE(a.hasError) << m;  // the handler of unparsable text sets no error
+    }
+  }
+}
+
+// The same depth as a profile: refused with the profile error, the modem untouched.
+TEST(FuzzRegressionUsbmodemMethods, AProfileNestedDeeperThanTheParserLimitIsRefused) {
+  const std::string input = Kept("usbmodem/nested-profile");
+  const int setProfile = 8;
+  ASSERT_STREQ(vornfuzz::UsbmodemMethodAt(setProfile).name, "SetProfile");
+  std::vector<std::string> args;
+  vornfuzz::UsbmodemAnswer a =
+      vornfuzz::CallUsbmodemMethodWithInput(setProfile, Bytes(input), input.size(), args);
+  vornfuzz::CheckUsbmodemAnswer(setProfile, args, a);
+  EXPECT_FALSE(a.ok);
+  EXPECT_EQ(a.domain, "error");
+}
+
 // Every file of a seed or regression directory.
 std::vector<std::string> InputsOf(std::string const& dir) {
   std::vector<std::string> out;
