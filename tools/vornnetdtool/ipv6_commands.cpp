@@ -126,7 +126,7 @@ int Prefix(std::vector<std::string> const& args) {
     const bool ok = sub == "allocate" ? prefixes.Allocate(args[1], args[2])
                                       : prefixes.Deallocate(args[1], args[2]);
     if (!ok) {
-      std::cerr << "vornnetdtool: ipv6-prefix allocate: no free prefix " << args[1] << "\n";
+      std::cerr << "vornnetdtool: ipv6-prefix " << sub << ": no free prefix " << args[1] << "\n";
       return 1;
     }
     return 0;

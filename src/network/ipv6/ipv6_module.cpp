@@ -1,6 +1,6 @@
 // The router advertisement watch. The watch thread is the only user of the socket; the context
 // map is shared with ResetIPv6Module on the D-Bus thread under _contextMutex, which an RA holds
-// from its first look at the map to its last write.
+// from its first look at the map to its last write, except while ndisc6 runs.
 #include "vornwireless/network/ipv6/ipv6_module.h"
 
 #include <arpa/inet.h>
@@ -405,7 +405,7 @@ InterfaceContext IPv6Module::GetContext(std::string const& ifname, bool* exists)
 
 void IPv6Module::ProcessRA(std::string const& gateway, std::string const& ifname,
                            unsigned char const* ra, int length, bool managed, bool other) {
-  std::lock_guard<std::recursive_mutex> lock(_contextMutex);
+  std::unique_lock<std::recursive_mutex> lock(_contextMutex);
   VORN_LOG(LOG_INFO, "Process RA from [%s] on interface [%s]", gateway.c_str(), ifname.c_str());
   if (!Ipv6Enable(ifname) || !IsRaValid(ra, length, ifname, managed)) {
     _contexts[ifname] = InterfaceContext("", 0, RA_STATE_NONE);
@@ -419,8 +419,13 @@ void IPv6Module::ProcessRA(std::string const& gateway, std::string const& ifname
       return;
     }
   } else {
-    if (IsGatewayReachable(ifname) && !IsRaExchangeable(ifname)) {
-      VORN_LOG(LOG_INFO, "Original gateway [%s] reachable.", context.gateway.c_str());
+    // ndisc6 may take seconds: ResetIPv6Module does not wait for it. A reset meanwhile leaves no
+    // context, whose RA time of 0 lets the new router in.
+    lock.unlock();
+    const bool reachable = IsGatewayReachable(ifname);
+    lock.lock();
+    if (reachable && !IsRaExchangeable(ifname)) {
+      VORN_LOG(LOG_INFO, "Original gateway [%s] reachable.", GetContext(ifname).gateway.c_str());
       return;
     }
     _contexts[ifname] = InterfaceContext("", Now(), RA_STATE_NONE);

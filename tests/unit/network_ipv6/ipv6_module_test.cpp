@@ -315,6 +315,25 @@ TEST_F(IPv6ModuleTest, ResetMakesTheNextRaApplyEvenFromTheSameRouter) {
   EXPECT_EQ((std::vector<std::string>{"2 eth0", "2 eth0"}), ModesSet());
 }
 
+TEST_F(IPv6ModuleTest, ResetDoesNotWaitForNdisc6AndLetsTheNewRouterIn) {
+  Feed(kSilent, Managed());
+  std::atomic<bool> done(false);
+  // ndisc6 asks the silent gateway for seconds.
+  std::thread ra([&]() {
+    Feed("fe80::2", StatelessOther());
+    done = true;
+  });
+  usleep(500000);
+  Json::Value request(Json::objectValue), response;
+  request["method"] = "RESET_IPV6_MODULE";
+  request["ifname"] = "eth0";
+  EXPECT_EQ(0, module.ProcessRequest(request, response));
+  EXPECT_FALSE(done.load());
+  ra.join();
+  EXPECT_EQ("fe80::2", module.GetContext("eth0").gateway);
+  EXPECT_EQ(3, module.GetContext("eth0").state);
+}
+
 TEST_F(IPv6ModuleTest, OtherRequestsAndBadRequestsChangeNothing) {
   Feed("fe80::1", Managed());
   Json::Value response;
