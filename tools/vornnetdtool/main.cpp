@@ -11,6 +11,7 @@
 #include <string>
 #include <vector>
 
+#include "auth_commands.h"
 #include "route_commands.h"
 #include "vornwireless/dbus_net/net_client.h"
 
@@ -55,6 +56,10 @@ const char kUsage[] =
     "  ipv6-router wan-address WAN IPV4            reconfigure after the WAN's address changed\n"
     "  ipv6-prefix list                            the /64 prefixes of the routers and their LANs\n"
     "  ipv6-prefix allocate|deallocate PREFIX LAN  give a prefix to a LAN or take it back\n"
+    "\n"
+    "802.1X:\n"
+    "  8021x SUBCOMMAND JSON                       port authentication of a wired interface\n"
+    "                                              (vornnetdtool 8021x --help)\n"
     "\n"
     "  --help                                      this text\n"
     "\n"
@@ -304,6 +309,7 @@ int Run(std::vector<std::string> const& args) {
   bool ipv6Command = false;
   const int ipv6Status = RunIpv6Command(cmd, rest, &ipv6Command);
   if (ipv6Command) return ipv6Status;
+  if (cmd == "8021x") return vornnetdtool::Auth8021XCommand(rest);
   NetClient client;
   if (cmd == "--refresh-gateway") {
     if (rest.size() != 1) throw UsageError{"--refresh-gateway needs one type"};

@@ -228,6 +228,13 @@ TEST_F(RealAuthTest, StoppingTheJobEndsTheSupplicant) {
   ASSERT_EQ(auth::Auth8021XSetConf("eth0", cfg, false), 0);
   pid_t pid = SupplicantPid();
   ASSERT_GT(pid, 0);
+  // The job's supplicant holds none of its starter's files or pipes.
+  auto fds = vorntest::Run(
+      {"/bin/sh", "-c", "for f in /proc/" + std::to_string(pid) + "/fd/*; do readlink $f; done"});
+  for (size_t at = 0, end; (end = fds.out.find('\n', at)) != std::string::npos; at = end + 1) {
+    std::string target = fds.out.substr(at, end - at);
+    EXPECT_TRUE(target == "/dev/null" || target.rfind("socket:", 0) == 0) << target;
+  }
   EXPECT_EQ(auth::Auth8021XStopDaemon("eth0", false), 0);
   EXPECT_EQ(SupplicantPid(), 0);
   std::string status;
