@@ -2,13 +2,16 @@
 // default route. The order of a list is its priority: index 0 is the most wanted gateway.
 #include "vornwireless/network/route/route_module.h"
 
+#include <fcntl.h>
 #include <net/if.h>
 #include <sys/socket.h>
+#include <sys/stat.h>
+#include <unistd.h>
 
 #include <algorithm>
+#include <cerrno>
 #include <climits>
 #include <exception>
-#include <fstream>
 
 #include "vornplatform/file.h"
 #include "vornplatform/gateway.h"
@@ -40,6 +43,40 @@ const char kIpCommand[] = "/sbin/ip";
 const int kExeclFlags = 187;
 const char kInfoFile[] = "/etc/vorninfo.conf";
 const char kConfigDir[] = "/etc/iproute2/config";
+
+enum class ResolverWrite { kDone, kCannotPlace, kCannotWrite };
+
+// Writes content to a temporary file in path's directory (mode 0644: the resolver reads it),
+// syncs it and renames it over path. kCannotPlace when no temporary file can be made there or
+// the rename fails (e.g. path is a directory), kCannotWrite when writing or syncing fails. The
+// temporary file never stays behind.
+ResolverWrite ReplaceResolverFile(char const* path, std::string const& content) {
+  std::string tmp = std::string(path) + ".tmp.XXXXXX";
+  int fd = mkostemp(&tmp[0], O_CLOEXEC);
+  if (fd < 0) return ResolverWrite::kCannotPlace;
+  bool ok = fchmod(fd, 0644) == 0;
+  std::size_t done = 0;
+  while (ok && done < content.size()) {
+    ssize_t n = write(fd, content.data() + done, content.size() - done);
+    if (n < 0 && errno == EINTR) continue;
+    if (n <= 0) {
+      ok = false;
+      break;
+    }
+    done += static_cast<std::size_t>(n);
+  }
+  ok = fsync(fd) == 0 && ok;
+  ok = close(fd) == 0 && ok;
+  if (!ok) {
+    unlink(tmp.c_str());
+    return ResolverWrite::kCannotWrite;
+  }
+  if (rename(tmp.c_str(), path) != 0) {
+    unlink(tmp.c_str());
+    return ResolverWrite::kCannotPlace;
+  }
+  return ResolverWrite::kDone;
+}
 
 // RAII for the platform's string list.
 struct SzList {
@@ -368,24 +405,24 @@ int RouteModule::WriteDnsFile(GATEWAY_TYPE type) {
     VORN_LOG(LOG_ERR, "Unknown type to write config");
     return -1;
   }
-  std::ofstream out(path, std::ios::out | std::ios::trunc);
-  if (!out.is_open()) {
-    VORN_LOG(LOG_ERR, "Failed to open file[%s]", path);
-    return -1;
-  }
+  std::string content;
   for (GatewayInfo const& info : *source) {
-    if (!info._dns.IsEmpty()) out << "nameserver " << info._dns.ToString() << "\n";
+    if (!info._dns.IsEmpty()) content += "nameserver " + info._dns.ToString() + "\n";
   }
-  // The resolver update reads the file while our stream is still open: flush it first.
-  out.flush();
-  bool const written = static_cast<bool>(out);
+  // Replaced as a whole (a temporary file beside it, fsync, rename): the resolver update and any
+  // other reader see the old list or the new one, never a cut one, even if we die meanwhile.
+  switch (ReplaceResolverFile(path, content)) {
+    case ResolverWrite::kCannotPlace:
+      VORN_LOG(LOG_ERR, "Failed to open file[%s]", path);
+      return -1;
+    case ResolverWrite::kCannotWrite:
+      VORN_LOG(LOG_ERR, "Failed to write file[%s]", path);
+      return -1;
+    case ResolverWrite::kDone:
+      break;
+  }
   if (VLIBCFileCheckKeyValue(kInfoFile, "dns_mode", "auto", 1) != 0) {
     vornnetsdk::sdk_s::VORNNetDNSUpdate_S();
-  }
-  out.close();
-  if (!written) {
-    VORN_LOG(LOG_ERR, "Failed to write file[%s]", path);
-    return -1;
   }
   return 0;
 }
