@@ -87,7 +87,7 @@ class AdapterCapabilityRLT : public AdapterCapability {
  private:
   // Kept for the agent layer; it goes stale when the adapter's record is replaced, so nothing
   // here follows it.
-  const AdapterConfig* _config;
+  [[maybe_unused]] const AdapterConfig* _config;
 };
 
 }  // namespace wifi

@@ -235,7 +235,10 @@ int ReadDump(int fd, uint16_t type, uint32_t seq, std::vector<char>& buffer,
     }
     if (from.nl_pid != 0) continue;
     int remaining = static_cast<int>(n);
-    for (nlmsghdr* h = reinterpret_cast<nlmsghdr*>(buffer.data()); NLMSG_OK(h, remaining);
+    // NLMSG_OK spelled out: the macro compares the unsigned length with the signed rest.
+    for (nlmsghdr* h = reinterpret_cast<nlmsghdr*>(buffer.data());
+         remaining >= static_cast<int>(sizeof(nlmsghdr)) && h->nlmsg_len >= sizeof(nlmsghdr) &&
+         h->nlmsg_len <= static_cast<unsigned>(remaining);
          h = NLMSG_NEXT(h, remaining)) {
       if (h->nlmsg_seq != seq) continue;
       if ((h->nlmsg_flags & NLM_F_DUMP_INTR) != 0) interrupted = true;
