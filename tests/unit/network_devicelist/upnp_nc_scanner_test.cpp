@@ -135,6 +135,20 @@ TEST_F(UpnpScannerTest, PortTakenFailsTheSearchWithItsLogLinesAndTheNextOneRuns)
   EXPECT_TRUE(log.Matching("cannot start upnp").empty()) << log.Dump();
 }
 
+TEST_F(UpnpScannerTest, HostileLocationsAddNothingAndTheSearchEndsCleanly) {
+  vorntest::PeerProcess responder("lan0", {vorntest::DeviceListFixture("ssdp-responder"), "10.200.1.1"},
+                                  "ready");
+  ASSERT_TRUE(responder.ready()) << responder.Output();
+  UpnpScanner* scanner = UpnpScanner::Inst();
+  scanner->GetData();
+  ASSERT_TRUE(SearchEnded()) << responder.Output();
+  EXPECT_NE(responder.Output().find("search from 10.200.1.2:"), std::string::npos)
+      << responder.Output();
+  // Not XML, too big, cut off, unreachable, refused: no device comes of any of them.
+  EXPECT_EQ(scanner->GetData()["ClientList"].size(), 0u);
+  EXPECT_EQ(scanner->Stop(), 0);
+}
+
 TEST(UpnpEvents, NullEventAndUnknownTypes) {
   SyslogCapture log;
   EXPECT_EQ(UpnpScanner::Inst()->HandleDiscovery(nullptr, 6), -1);
