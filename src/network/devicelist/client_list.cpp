@@ -59,16 +59,16 @@ bool HasMember(Json::Value const& object, char const* key) {
   return object.isObject() && object.isMember(key);
 }
 
-// What the lookup index knows of a key: absent, a string (with its text), or another type.
-std::string KeyState(Json::Value const& device, char const* key) {
-  if (!HasMember(device, key)) return std::string();
-  Json::Value const& value = device[key];
-  return value.isString() ? "s" + value.asString() : std::string("o");
-}
-
 void SetIfDifferent(Json::Value& device, char const* key, std::string const& text) {
   Json::Value& member = device[key];
-  if (!member.isString() || member.asString() != text) member = text;
+  char const* begin = nullptr;
+  char const* end = nullptr;
+  if (member.isString() && member.getString(&begin, &end) &&
+      static_cast<size_t>(end - begin) == text.size() &&
+      std::memcmp(begin, text.data(), text.size()) == 0) {
+    return;
+  }
+  member = text;
 }
 
 std::string DisplayName(Json::Value const& device) {
@@ -208,16 +208,18 @@ bool ClientList::UpdateKeys(char const* key, std::string const& value, Json::Val
     if (VerifyIsExist(key, value, index)) {
       // Changed in place; members whose value is already the same are left untouched.
       Json::Value& device = (*DeviceArray(_document))[index];
-      bool const keysGiven = object.isMember("macAddr") || object.isMember("ipAddr");
-      std::string const oldMac = keysGiven ? KeyState(device, "macAddr") : std::string();
-      std::string const oldIp = keysGiven ? KeyState(device, "ipAddr") : std::string();
       for (auto it = object.begin(); it != object.end(); ++it) {
-        Json::Value& member = device[it.name()];
-        if (!(member == *it)) member = *it;
-      }
-      if (keysGiven &&
-          (oldMac != KeyState(device, "macAddr") || oldIp != KeyState(device, "ipAddr"))) {
-        _indexValid = false;  // a key moved: the lookup index no longer holds
+        char const* end = nullptr;
+        char const* name = it.memberName(&end);
+        Json::Value& member = *device.demand(name, end);
+        if (member == *it) continue;
+        // A changed key moves the device in the lookup index.
+        size_t const length = static_cast<size_t>(end - name);
+        if ((length == 7 && std::memcmp(name, "macAddr", 7) == 0) ||
+            (length == 6 && std::memcmp(name, "ipAddr", 6) == 0)) {
+          _indexValid = false;
+        }
+        member = *it;
       }
       SetIfDifferent(device, "displayName", DisplayName(device));
       SetIfDifferent(device, "asso_time", now);
