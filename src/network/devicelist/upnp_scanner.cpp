@@ -73,49 +73,6 @@ std::string FindLanBridge(std::string* address) {
   return found;
 }
 
-// A device description is a few kilobytes; anything far bigger is refused while it is read, so
-// a hostile LAN device cannot keep the search (and with it the daemon's stop) busy with
-// megabytes or an endless stream. Each step of the download waits at most kHttpSeconds.
-const size_t kMaxDescriptionBytes = 256 * 1024;
-const int kHttpSeconds = 5;
-
-// UpnpDownloadXmlDoc with a size limit: open, read up to the limit, parse.
-int DownloadDescription(char const* location, IXML_Document** document) {
-  void* handle = nullptr;
-  char* contentType = nullptr;
-  int length = 0;
-  int status = 0;
-  int err = UpnpOpenHttpGet(location, &handle, &contentType, &length, &status, kHttpSeconds);
-  if (err != UPNP_E_SUCCESS) return err;
-  std::string body;
-  if (status != 200) {
-    err = UPNP_E_BAD_RESPONSE;
-  } else if (length > 0 && static_cast<size_t>(length) > kMaxDescriptionBytes) {
-    err = UPNP_E_OUTOF_BOUNDS;
-  } else {
-    char buffer[4096];
-    for (;;) {
-      size_t size = sizeof(buffer);
-      err = UpnpReadHttpGet(handle, buffer, &size, kHttpSeconds);
-      if (err != UPNP_E_SUCCESS || size == 0) break;
-      body.append(buffer, size);
-      if (body.size() > kMaxDescriptionBytes) {
-        err = UPNP_E_OUTOF_BOUNDS;
-        break;
-      }
-      if (length >= 0 && body.size() >= static_cast<size_t>(length)) break;
-    }
-  }
-  UpnpCloseHttpGet(handle);
-  if (err == UPNP_E_OUTOF_BOUNDS) {
-    VORN_LOG(LOG_ERR, "description at %s is larger than %zu bytes, skip it", location,
-             kMaxDescriptionBytes);
-  }
-  if (err != UPNP_E_SUCCESS) return err;
-  err = ixmlParseBufferEx(body.c_str(), document);
-  return err == IXML_SUCCESS ? UPNP_E_SUCCESS : UPNP_E_INVALID_DESC;
-}
-
 // The library's callback type, forwarded to the scanner's handler.
 int LibraryCallback(Upnp_EventType type, void const* event, void* cookie) {
   return UpnpScanner::CallbackEventHandler(static_cast<int>(type), event, cookie);
@@ -324,11 +281,8 @@ int UpnpScanner::HandleDiscovery(void const* event, int /*type*/) {
   char const* location = UpnpDiscovery_get_Location_cstr(discovery);
   if (location == nullptr || location[0] == '\0') return 0;
   IXML_Document* document = nullptr;
-  err = DownloadDescription(location, &document);
-  if (err != UPNP_E_SUCCESS) {
-    VORN_LOG(LOG_DEBUG, "description at %s not read: %d", location, err);
-    return err;
-  }
+  err = UpnpDownloadXmlDoc(location, &document);
+  if (err != UPNP_E_SUCCESS) return err;
   Json::Value object(Json::objectValue);
   static char const* const kTags[] = {"deviceType", "modelName", "modelDescription",
                                       "friendlyName", "manufacturer"};
