@@ -282,7 +282,10 @@ int UpnpScanner::HandleDiscovery(void const* event, int /*type*/) {
   if (location == nullptr || location[0] == '\0') return 0;
   IXML_Document* document = nullptr;
   err = UpnpDownloadXmlDoc(location, &document);
-  if (err != UPNP_E_SUCCESS) return err;
+  if (err != UPNP_E_SUCCESS) {
+    VORN_LOG(LOG_DEBUG, "description at %s not read: %d", location, err);
+    return err;
+  }
   Json::Value object(Json::objectValue);
   static char const* const kTags[] = {"deviceType", "modelName", "modelDescription",
                                       "friendlyName", "manufacturer"};

@@ -140,12 +140,21 @@ TEST_F(UpnpScannerTest, HostileLocationsAddNothingAndTheSearchEndsCleanly) {
                                   "ready");
   ASSERT_TRUE(responder.ready()) << responder.Output();
   UpnpScanner* scanner = UpnpScanner::Inst();
+  SyslogCapture log;
   scanner->GetData();
   ASSERT_TRUE(SearchEnded()) << responder.Output();
   EXPECT_NE(responder.Output().find("search from 10.200.1.2:"), std::string::npos)
       << responder.Output();
-  // Not XML, too big, cut off, unreachable, refused: no device comes of any of them.
+  // Not XML, too big, cut off, unreachable, refused: each was tried, none gives a device.
   EXPECT_EQ(scanner->GetData()["ClientList"].size(), 0u);
+  for (char const* location :
+       {"http://10.200.1.1:8080/notxml", "http://10.200.1.1:8080/huge",
+        "http://10.200.1.1:8080/cut", "http://10.200.1.250:80/d.xml", "http://10.200.1.1:9/closed"}) {
+    EXPECT_FALSE(log.Matching("^" + std::string(kUpnpSource) + ":[0-9]+ description at " +
+                              location + " not read: -[0-9]+$")
+                     .empty())
+        << location << "\n" << log.Dump();
+  }
   EXPECT_EQ(scanner->Stop(), 0);
 }
 
