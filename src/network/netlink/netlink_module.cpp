@@ -53,7 +53,8 @@ const std::size_t kMaxRecvBufferBytes = 1024 * 1024;
 const int kSocketBufferBytes = 4 * 1024 * 1024;
 // Environment variable that sets the socket's receive buffer instead (bytes).
 const char kRecvBufferKnob[] = "VORN_NETLINK_RCVBUF";
-// Datagrams read in one go before the thread looks at its stop flag and the socket again.
+// Reads (of up to kDatagramsPerRead datagrams each) in one go before the thread looks at its
+// stop flag and the socket again.
 const int kDatagramsPerWake = 256;
 // Queued datagrams dropped at most before the state is read again (a flood that never pauses
 // must not keep the thread from reading it).
@@ -278,7 +279,9 @@ NetlinkModule::NetlinkModule()
       _stopRequested(false),
       _threadEnded(false),
       _pollingTid(0),
-      _recvBuffer(),
+      _recvArea(),
+      _slotBytes(0),
+      _lastDatagrams(0),
       _resyncPending(false),
       _lostCount(0),
       _known() {}
@@ -519,7 +522,8 @@ int NetlinkModule::StartPolling() {
           result = 0;
         }
         if (_resyncPending) break;
-        if (result != 0) break;
+        // Fewer than asked for: the queue is empty (poll tells when more comes).
+        if (result != 0 || _lastDatagrams < kDatagramsPerRead) break;
       }
     }
     if (_resyncPending && !_stopRequested) {
@@ -533,26 +537,39 @@ int NetlinkModule::StartPolling() {
   return 0;
 }
 
+void NetlinkModule::EnsureRecvArea(std::size_t slotBytes) {
+  if (_recvArea && _slotBytes >= slotBytes) return;
+  // Not zeroed: only the pages a datagram is written to become resident.
+  _recvArea.reset(new char[slotBytes * kDatagramsPerRead]);
+  _slotBytes = slotBytes;
+}
+
 int NetlinkModule::AnalysisNetlinkMessage() {
-  if (_recvBuffer.size() < kRecvBufferBytes) _recvBuffer.resize(kRecvBufferBytes);
-  struct sockaddr_nl addr;
-  std::memset(&addr, 0, sizeof addr);
-  struct iovec iov;
-  iov.iov_base = _recvBuffer.data();
-  iov.iov_len = _recvBuffer.size();
-  struct msghdr msg;
-  std::memset(&msg, 0, sizeof msg);
-  msg.msg_name = &addr;
-  msg.msg_namelen = sizeof addr;
-  msg.msg_iov = &iov;
-  msg.msg_iovlen = 1;
-  // MSG_TRUNC: the result is the datagram's whole length even when the buffer held less.
-  const ssize_t received = recvmsg(_netlinkFd, &msg, MSG_DONTWAIT | MSG_TRUNC);
-  if (received < 0 && (errno == EAGAIN || errno == EWOULDBLOCK || errno == EINTR)) return 1;
-  if (received < 1) {
+  _lastDatagrams = 0;
+  EnsureRecvArea(kRecvBufferBytes);
+  struct sockaddr_nl addrs[kDatagramsPerRead];
+  struct iovec iovs[kDatagramsPerRead];
+  struct mmsghdr msgs[kDatagramsPerRead];
+  std::memset(addrs, 0, sizeof addrs);
+  std::memset(msgs, 0, sizeof msgs);
+  for (int i = 0; i < kDatagramsPerRead; ++i) {
+    iovs[i].iov_base = _recvArea.get() + static_cast<std::size_t>(i) * _slotBytes;
+    iovs[i].iov_len = _slotBytes;
+    msgs[i].msg_hdr.msg_name = &addrs[i];
+    msgs[i].msg_hdr.msg_namelen = sizeof addrs[i];
+    msgs[i].msg_hdr.msg_iov = &iovs[i];
+    msgs[i].msg_hdr.msg_iovlen = 1;
+  }
+  // Whatever is queued, a few datagrams in one call. MSG_TRUNC: each length is the datagram's
+  // whole length even when its buffer held less.
+  const int count = recvmmsg(_netlinkFd, msgs, kDatagramsPerRead, MSG_DONTWAIT | MSG_TRUNC,
+                             nullptr);
+  if (count < 0 && (errno == EAGAIN || errno == EWOULDBLOCK || errno == EINTR)) return 1;
+  if (count < 1) {
     const int err = errno;
-    VORN_LOG(LOG_ERR, "recvmsg ret: [%zd] from fd [%d].", received, _netlinkFd);
-    if (received < 0 && err == ENOBUFS) {
+    VORN_LOG(LOG_ERR, "recvmsg ret: [%zd] from fd [%d].", static_cast<ssize_t>(count < 0 ? -1 : 0),
+             _netlinkFd);
+    if (count < 0 && err == ENOBUFS) {
       // The socket overflowed: the kernel dropped messages and keeps dropping until the queue
       // is empty.
       ++_lostCount;
@@ -562,21 +579,35 @@ int NetlinkModule::AnalysisNetlinkMessage() {
     }
     return -1;
   }
-  if ((msg.msg_flags & MSG_TRUNC) != 0 || static_cast<std::size_t>(received) > _recvBuffer.size()) {
-    ++_lostCount;
-    _resyncPending = true;
-    VORN_LOG(LOG_WARNING,
-             "Netlink datagram of [%zd] bytes cut to [%zu] (MSG_TRUNC), reading the link and "
-             "address state again",
-             received, _recvBuffer.size());
-    if (static_cast<std::size_t>(received) <= kMaxRecvBufferBytes) {
-      _recvBuffer.resize(NLMSG_ALIGN(static_cast<std::size_t>(received)));
+  _lastDatagrams = count;
+  for (int i = 0; i < count && !_stopRequested; ++i) {
+    const std::size_t received = msgs[i].msg_len;
+    if (received == 0) {
+      VORN_LOG(LOG_ERR, "recvmsg ret: [%zd] from fd [%d].", static_cast<ssize_t>(0), _netlinkFd);
+      continue;
     }
-    return 0;
+    if ((msgs[i].msg_hdr.msg_flags & MSG_TRUNC) != 0 || received > _slotBytes) {
+      ++_lostCount;
+      _resyncPending = true;
+      VORN_LOG(LOG_WARNING,
+               "Netlink datagram of [%zu] bytes cut to [%zu] (MSG_TRUNC), reading the link and "
+               "address state again",
+               received, _slotBytes);
+      if (received <= kMaxRecvBufferBytes) {
+        EnsureRecvArea(NLMSG_ALIGN(received));
+      }
+      // What came with it is older than the state read next: not looked at either.
+      return 0;
+    }
+    HandleDatagram(static_cast<char*>(iovs[i].iov_base), static_cast<ssize_t>(received),
+                   addrs[i].nl_pid == 0);
   }
-  const bool fromKernel = addr.nl_pid == 0;
+  return 0;
+}
+
+void NetlinkModule::HandleDatagram(char* data, ssize_t received, bool fromKernel) {
   ssize_t remaining = received;
-  char* cursor = _recvBuffer.data();
+  char* cursor = data;
   while (remaining >= static_cast<ssize_t>(sizeof(nlmsghdr)) && !_stopRequested) {
     nlmsghdr* header = reinterpret_cast<nlmsghdr*>(cursor);
     if (header->nlmsg_len < sizeof(nlmsghdr) ||
@@ -609,7 +640,6 @@ int NetlinkModule::AnalysisNetlinkMessage() {
     cursor += step;
     remaining -= step;
   }
-  return 0;
 }
 
 void NetlinkModule::NoteKernelMessage(nlmsghdr const* header) {
@@ -777,11 +807,10 @@ int NetlinkModule::ResyncKernelState() {
   // What is queued is older than the state read next: dropped unread. Its changes are part of
   // the difference reported below. While the queue is not empty the kernel drops new messages
   // anyway.
-  if (_recvBuffer.size() < kRecvBufferBytes) _recvBuffer.resize(kRecvBufferBytes);
+  EnsureRecvArea(kRecvBufferBytes);
   long dropped = 0;
   while (dropped < kMaxDroppedDatagrams && !_stopRequested && _netlinkFd >= 0) {
-    const ssize_t n = recv(_netlinkFd, _recvBuffer.data(), _recvBuffer.size(),
-                           MSG_DONTWAIT | MSG_TRUNC);
+    const ssize_t n = recv(_netlinkFd, _recvArea.get(), _slotBytes, MSG_DONTWAIT | MSG_TRUNC);
     if (n < 0 && (errno == ENOBUFS || errno == EINTR)) continue;
     if (n < 0) break;
     ++dropped;

@@ -20,6 +20,7 @@
 
 #include <atomic>
 #include <map>
+#include <memory>
 #include <string>
 #include <unordered_map>
 #include <vector>
@@ -66,6 +67,8 @@ class NetlinkModule : public BaseModule {
   static const unsigned int kNetlinkGroups = 0x151;
   // The receive buffer a datagram is read into at first; a datagram cut short grows it.
   static const std::size_t kRecvBufferBytes = 64 * 1024;
+  // Datagrams read with one system call at most.
+  static const int kDatagramsPerRead = 8;
   // How long TerminateModule lets a running hook or action finish before its process group is
   // killed.
   static const int kStopGraceMs = 1000;
@@ -95,9 +98,10 @@ class NetlinkModule : public BaseModule {
   // The polling thread's body: fills the maps, then waits for messages until TerminateModule.
   virtual int StartPolling();
 
-  // One datagram from the socket (without waiting), dispatched message by message. 0; 1 when
-  // nothing was queued; -1 when recvmsg failed (logged). A datagram cut short is not looked at
-  // and, like a failure with ENOBUFS, marks the state to be read again (ResyncPending()).
+  // The datagrams queued on the socket (up to kDatagramsPerRead, without waiting), dispatched
+  // message by message. 0; 1 when nothing was queued; -1 when the read failed (logged). A
+  // datagram cut short is not looked at, nor what came with it, and, like a failure with
+  // ENOBUFS, marks the state to be read again (ResyncPending()).
   int AnalysisNetlinkMessage();
   // Whether events were lost since the state was last read whole.
   bool ResyncPending() const { return _resyncPending; }
@@ -163,6 +167,10 @@ class NetlinkModule : public BaseModule {
   // The name of an interface index: from the links the kernel reported, else if_indextoname.
   std::string NameOfIndex(int index) const;
   void RebuildIndexNames();
+  // The receive buffers, each of slotBytes at least.
+  void EnsureRecvArea(std::size_t slotBytes);
+  // The messages of one datagram, each to its check (and, from the kernel, to the known state).
+  void HandleDatagram(char* data, ssize_t received, bool fromKernel);
   // Kills the process groups of the children the polling thread waits for (a hook, an action).
   void KillPollingThreadChildren() const;
 
@@ -176,7 +184,9 @@ class NetlinkModule : public BaseModule {
   std::atomic<bool> _stopRequested;
   std::atomic<bool> _threadEnded;
   std::atomic<pid_t> _pollingTid;
-  std::vector<char> _recvBuffer;
+  std::unique_ptr<char[]> _recvArea;  // kDatagramsPerRead buffers of _slotBytes each
+  std::size_t _slotBytes;
+  int _lastDatagrams;  // datagrams the last AnalysisNetlinkMessage read
   bool _resyncPending;
   long _lostCount;
   KernelState _known;
