@@ -280,9 +280,11 @@ TEST_F(LinkFlood, SigtermEndsTheDaemonWhileAHookNeverEnds) {
       std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
   std::printf("vornnetd exited %.3f s after SIGTERM with a hook sleeping 1000 s\n", took);
   daemon_.reset();
-  // Neither the hook nor its child outlives the daemon.
+  // Neither the hook, nor its child, nor anything of its process group outlives the daemon.
   EXPECT_TRUE(WaitFor([&] { return kill(hook, 0) != 0 && kill(child, 0) != 0; }, 5))
       << hook << " " << child;
+  EXPECT_EQ(group, hook) << "the hook does not lead a process group of its own";
+  EXPECT_TRUE(WaitFor([&] { return kill(-group, 0) != 0; }, 5)) << group;
 }
 
 }  // namespace
