@@ -281,20 +281,53 @@ TEST_F(ServiceWire, IntrospectionListsMethodsWithArgumentNames) {
       << r.out;
 }
 
+// The replies of two calls, in the order they arrived.
+struct Replies {
+  std::vector<std::string> order;
+  int pending = 0;
+  GMainLoop* loop = nullptr;
+};
+
+void OnStringReply(GObject* source, GAsyncResult* result, gpointer data) {
+  auto* replies = static_cast<Replies*>(data);
+  GError* error = nullptr;
+  GVariant* v = g_dbus_connection_call_finish(G_DBUS_CONNECTION(source), result, &error);
+  if (v != nullptr) {
+    const char* text = nullptr;
+    g_variant_get(v, "(&s)", &text);
+    replies->order.push_back(text);
+    g_variant_unref(v);
+  } else {
+    replies->order.push_back(std::string("error: ") + error->message);
+    g_error_free(error);
+  }
+  if (--replies->pending == 0) g_main_loop_quit(replies->loop);
+}
+
+// Both calls leave on one connection, so the service receives Sleep before Echo. Handlers that
+// ran side by side would answer the echo while the sleeper still sleeps; one at a time, the
+// sleeper's reply comes first (event order, no clock involved).
 TEST_F(ServiceWire, HandlersRunOneAtATime) {
-  std::chrono::steady_clock::time_point sleepDone;
-  std::thread sleeper([&] {
-    RunResult r = Gdbus("Sleep", {"1500"});
-    sleepDone = std::chrono::steady_clock::now();
-    EXPECT_EQ("('slept',)\n", r.out);
-  });
-  std::this_thread::sleep_for(std::chrono::milliseconds(500));
-  RunResult r = Gdbus("Echo", {"queued"});
-  auto echoDone = std::chrono::steady_clock::now();
-  sleeper.join();
-  EXPECT_EQ("('echo:queued',)\n", r.out);
-  // The echo was answered only once the sleeping handler had returned.
-  EXPECT_GE(echoDone, sleepDone - std::chrono::milliseconds(100));
+  GError* error = nullptr;
+  GDBusConnection* bus = g_bus_get_sync(G_BUS_TYPE_SESSION, nullptr, &error);
+  ASSERT_NE(nullptr, bus) << (error != nullptr ? error->message : "");
+  GMainContext* context = g_main_context_new();
+  g_main_context_push_thread_default(context);
+  Replies replies;
+  replies.loop = g_main_loop_new(context, FALSE);
+  replies.pending = 2;
+  g_dbus_connection_call(bus, kService, "/", "com.vornlink.test", "Sleep",
+                         g_variant_new("(s)", "1500"), G_VARIANT_TYPE("(s)"),
+                         G_DBUS_CALL_FLAGS_NONE, 60000, nullptr, OnStringReply, &replies);
+  g_dbus_connection_call(bus, kService, "/", "com.vornlink.test", "Echo",
+                         g_variant_new("(s)", "queued"), G_VARIANT_TYPE("(s)"),
+                         G_DBUS_CALL_FLAGS_NONE, 60000, nullptr, OnStringReply, &replies);
+  g_main_loop_run(replies.loop);  // both calls end: with a reply or their 60 s timeout
+  g_main_loop_unref(replies.loop);
+  g_main_context_pop_thread_default(context);
+  g_main_context_unref(context);
+  g_object_unref(bus);
+  EXPECT_EQ((std::vector<std::string>{"slept", "echo:queued"}), replies.order);
 }
 
 TEST(EmbeddedXml, IsTheFileText) {
