@@ -213,7 +213,8 @@ TEST_F(AdapterList, ANewAdapterWhoseAgentFailsToStartIsStillListed) {
 }
 
 TEST_F(AdapterList, WithoutAnAgentNoAdapterIsMade) {
-  AdapterAgent::SetMaker(nullptr);  // the library alone has no agent kind
+  EXPECT_EQ(nullptr, previous_);  // the library alone registers no agent kind
+  AdapterAgent::SetMaker(nullptr);
   SyslogCapture log;
   EXPECT_EQ(-1, Adapter::AddAdapter("wlan0"));
   EXPECT_TRUE(Adapter::GetList().empty());
