@@ -32,14 +32,16 @@ gboolean OnStopSignal(gpointer server) {
   return G_SOURCE_CONTINUE;
 }
 
-// There is no stop-all in the manager: the modules go one at a time, the link watcher first
-// (it is the last started) and the rest in descending type order.
+// There is no stop-all in the manager: the modules go one at a time. The two with threads that
+// send requests to other modules go first (the link watcher, then the IPv6 watch, whose thread
+// calls the route module), so that no request reaches a module that is already gone.
 void RemoveModules(ModuleManager& manager) {
-  for (int type = vornnetwork::network::module::MODULE_NETLINK;
-       type >= vornnetwork::network::module::MODULE_TEST; --type) {
-    MODULE_TYPE t = static_cast<MODULE_TYPE>(type);
+  using namespace vornnetwork::network::module;
+  static MODULE_TYPE const order[] = {MODULE_NETLINK, MODULE_IPV6, MODULE_DEVICELIST, MODULE_ROUTE,
+                                      MODULE_TEST};
+  for (MODULE_TYPE t : order) {
     if (!manager.IsModuleExist(t)) continue;
-    if (manager.RemoveModule(t)) NETD_LOG(LOG_ERR, "Failed to remove module [%d]", type);
+    if (manager.RemoveModule(t)) NETD_LOG(LOG_ERR, "Failed to remove module [%d]", t);
   }
 }
 
